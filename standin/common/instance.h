@@ -1,0 +1,95 @@
+// The stand-in engine's model of one instance, read from
+// <instance directory>/instance.json.
+#pragma once
+
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace standin {
+
+struct Pool {
+    uint32_t id = 0;
+    std::optional<int64_t> current;
+    std::optional<int64_t> maximum;
+    std::optional<int64_t> highWater;
+    std::optional<std::string> bufferPool;
+};
+
+struct Database {
+    std::string name;
+    std::vector<Pool> pools;
+};
+
+struct Application {
+    uint32_t number = 0;
+    std::string database;
+    std::vector<Pool> pools;
+};
+
+struct PrivateMemory {
+    uint32_t number = 0;
+    std::vector<Pool> pools;
+};
+
+// How the monitor answers one object type.
+struct SnapshotAnswer {
+    int32_t sizeRc = 0;
+    int32_t sizeSqlcode = 0;
+    int32_t takeRc = 0;
+    int32_t takeSqlcode = 0;
+    std::optional<uint32_t> estimate;
+    uint32_t tooSmall = 0;
+    std::optional<std::string> streamFile;  // relative to the instance directory
+};
+
+enum class SnapshotKind { Instance = 0, Database = 1, Application = 2 };
+
+struct Faults {
+    std::optional<int32_t> initApplicationEnvironment;
+    std::optional<int32_t> getDateTime;
+    std::optional<int32_t> registryRead;
+    std::optional<int32_t> registryWrite;
+    std::optional<int32_t> sqlaintp;
+    std::vector<uint32_t> messageFail;
+    std::optional<uint64_t> allocFailAt;
+    uint64_t maxAllocBytes = uint64_t{1} << 30;
+};
+
+struct Krcb {
+    uint32_t multiPartition = 0;
+    int16_t partition = 0;
+    int16_t defaultPartition = 0;
+};
+
+enum class State { Started, Stopped, Unauthorized };
+
+struct Clock {
+    uint16_t year, month, day, hour, minute, second;
+};
+
+struct Instance {
+    std::optional<Clock> clock;  // absent: the real local time
+    uint32_t traceFlags = 0;
+    std::optional<uint32_t> maxPoolId;
+    Krcb krcb;
+    State state = State::Started;
+    std::vector<Pool> pools;
+    std::vector<Database> databases;
+    std::vector<Application> applications;
+    std::vector<PrivateMemory> privateMemory;
+    SnapshotAnswer snapshots[3];
+    Faults faults;
+};
+
+// The instance directory: VRX_INSTANCE_DIR when set and not empty, else the
+// built-in demo instance.
+std::filesystem::path instanceDirectory();
+
+// Reads and validates <dir>/instance.json. On failure returns false and
+// `error` says exactly what is wrong (file, line and column for bad JSON).
+bool loadInstance(const std::filesystem::path& dir, Instance& out, std::string& error);
+
+}  // namespace standin
