@@ -92,4 +92,16 @@ std::filesystem::path instanceDirectory();
 // `error` says exactly what is wrong (file, line and column for bad JSON).
 bool loadInstance(const std::filesystem::path& dir, Instance& out, std::string& error);
 
+// The instance as the system services see it: loaded on first use and again
+// whenever the instance directory or its instance.json changes (path, size,
+// modification time), so that a process that switches VRX_INSTANCE_DIR, or
+// an edited file, is followed. The defaults when the file cannot be read or
+// is not valid. Not for signal handlers.
+const Instance& currentInstance();
+
+// The engine's installed data (catalogs under locale/, the demo instance
+// under demo/): found relative to the library that asks, so that the build
+// tree and an installed tree both work.
+std::filesystem::path dataDirectory();
+
 }  // namespace standin
