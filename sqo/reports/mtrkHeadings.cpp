@@ -1,0 +1,26 @@
+#include <cstdio>
+
+#include "messages/mtrkFunctionIds.h"
+#include "messages/mtrkMessages.h"
+#include "messages/mtrkTrace.h"
+#include "reports/mtrkReports.h"
+
+int32_t mtrkPrintNotice(uint32_t messageNumber) {
+    char message[MTRK_TEXT_SIZE];
+    int32_t rc = mtrkGetMessage(messageNumber, message, sizeof message, 0);
+    if (rc == 0) {
+        printf("%s\n\n", message);
+    }
+    return rc;
+}
+
+int32_t mtrkPrintHeading(uint32_t messageNumber, const char* text) {
+    char message[MTRK_TEXT_SIZE] = {};
+    uint32_t traceFlags = mtrkTraceEntry(MTRK_FID_PRINT_HEADING);
+    int32_t rc = mtrkGetMessage(messageNumber, message, sizeof message, 1, text);
+    if (rc == 0) {
+        printf("%s\n\n", message);
+    }
+    mtrkTraceExit(MTRK_FID_PRINT_HEADING, traceFlags, rc);
+    return rc;
+}
