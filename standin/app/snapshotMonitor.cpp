@@ -1,0 +1,274 @@
+// The snapshot monitor: vrxGetSnapshotSize and vrxGetSnapshot.
+//
+// Every request reads the instance afresh, so that an edited instance.json
+// shows in the next snapshot of a running client. A request is checked
+// before anything is read; a refused request is a nonzero call result (see
+// snapshotCodes.h). What the monitor has to say about the instance is the
+// SQL code in the sqlca.
+#include <algorithm>
+#include <array>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <map>
+#include <mutex>
+#include <optional>
+#include <string>
+
+#include "app/snapshotCodes.h"
+#include "app/streamEncoder.h"
+#include "common/diagLog.h"
+#include "common/instance.h"
+#include "common/registry.h"
+#include "engine/vrxapp.h"
+
+namespace standin {
+
+namespace {
+
+constexpr int32_t kSqlOk = 0;
+constexpr uint64_t kMaxBuffer = 0xFFFFFFFFu;
+
+const char* kindName(SnapshotKind kind) {
+    switch (kind) {
+        case SnapshotKind::Instance:
+            return "instance";
+        case SnapshotKind::Database:
+            return "database";
+        case SnapshotKind::Application:
+            return "application";
+    }
+    return "?";
+}
+
+void answer(sqlca* ca, int32_t sqlCode) {
+    std::memset(ca, 0, sizeof(*ca));
+    std::memcpy(ca->sqlcaid, "SQLCA   ", sizeof(ca->sqlcaid));
+    ca->sqlcabc = sizeof(sqlca);
+    ca->sqlcode = sqlCode;
+}
+
+int32_t checkObject(const MonRequest* request, SnapshotKind* kind) {
+    if (request == nullptr)
+        return kMonBadArgument;
+    if (request->objectCount != 1)
+        return kMonBadObjectCount;
+    switch (request->objectType) {
+        case VRX_OBJ_INSTANCE:
+            *kind = SnapshotKind::Instance;
+            return 0;
+        case VRX_OBJ_DATABASE:
+            *kind = SnapshotKind::Database;
+            return 0;
+        case VRX_OBJ_APPLICATION:
+            *kind = SnapshotKind::Application;
+            return 0;
+        default:
+            return kMonBadObjectType;
+    }
+}
+
+int32_t checkAddressing(uint32_t streamVersion, int32_t partition, uint32_t selector) {
+    if (streamVersion != VRX_STREAM_VERSION)
+        return kMonBadStreamVersion;
+    if (partition != -1 || selector != 0)
+        return kMonBadArgument;
+    return 0;
+}
+
+// The instance as one request sees it, with the stream it would be served.
+struct Served {
+    std::filesystem::path dir;
+    Instance instance;
+    SnapshotKind kind = SnapshotKind::Instance;
+    std::optional<std::string> fileStream;  // a streamFile's bytes, as they stand
+
+    const SnapshotAnswer& shape() const { return instance.snapshots[static_cast<int>(kind)]; }
+};
+
+int32_t loadServed(SnapshotKind kind, Served& served) {
+    served.kind = kind;
+    served.dir = instanceDirectory();
+    std::string error;
+    if (!loadInstance(served.dir, served.instance, error)) {
+        logEngineProblem("snapshot monitor: " + error);
+        return kMonInstanceUnreadable;
+    }
+    return 0;
+}
+
+int32_t loadFileStream(Served& served) {
+    const auto& file = served.shape().streamFile;
+    if (!file)
+        return 0;
+    std::filesystem::path path = served.dir / *file;
+    std::ifstream in(path, std::ios::binary);
+    std::string bytes;
+    if (in)
+        bytes.assign(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+    if (!in.is_open() || in.bad()) {
+        logEngineProblem(std::string("snapshot monitor: instance.json: snapshots.") +
+                         kindName(served.kind) + ".streamFile: cannot read " + path.string());
+        return kMonInstanceUnreadable;
+    }
+    served.fileStream = std::move(bytes);
+    return 0;
+}
+
+// The SQL code with which the instance's state and content refuse a
+// snapshot of this kind, or 0.
+int32_t refusal(const Served& served, int32_t configuredCode) {
+    if (served.instance.state == State::Stopped)
+        return SQLC_INSTANCE_STOPPED;
+    if (served.instance.state == State::Unauthorized)
+        return SQLC_NOT_AUTHORIZED;
+    if (configuredCode != 0)
+        return configuredCode;
+    if (served.fileStream)
+        return kSqlOk;
+    const Instance& inst = served.instance;
+    switch (served.kind) {
+        case SnapshotKind::Database:
+            if (inst.databases.empty())
+                return SQLC_NOTHING_TO_REPORT;
+            break;
+        case SnapshotKind::Application:
+            if (inst.applications.empty() && inst.privateMemory.empty()) {
+                return SQLC_NOTHING_TO_REPORT;
+            }
+            break;
+        case SnapshotKind::Instance:
+            break;
+    }
+    return kSqlOk;
+}
+
+StreamScope scopeOf(const Served& served) {
+    return StreamScope{served.kind, internalPoolsExposed(served.dir.c_str())};
+}
+
+uint64_t streamSize(const Served& served, StreamScope scope) {
+    if (served.fileStream)
+        return served.fileStream->size();
+    return encodedStreamSize(served.instance, scope);
+}
+
+// Takes that answer 1606 whatever the buffer, counted per object type for
+// as long as the process lives. The count is kept per instance directory,
+// so that a process that serves one instance after another (a test suite)
+// starts each one afresh.
+bool forcedTooSmall(const Served& served) {
+    static std::mutex mutex;
+    static std::map<std::string, std::array<uint32_t, 3>> taken;
+    uint32_t limit = served.shape().tooSmall;
+    if (limit == 0)
+        return false;
+    std::lock_guard lock(mutex);
+    uint32_t& count = taken[served.dir.string()][static_cast<int>(served.kind)];
+    if (count >= limit)
+        return false;
+    ++count;
+    return true;
+}
+
+int32_t getSnapshotSize(uint32_t version, MonSizeRequest* request, sqlca* ca) {
+    if (version != VRX_MONITOR_VERSION)
+        return kMonBadInterfaceVersion;
+    if (request == nullptr || ca == nullptr || request->estimate == nullptr) {
+        return kMonBadArgument;
+    }
+    if (int32_t rc =
+            checkAddressing(request->streamVersion, request->partition, request->selector)) {
+        return rc;
+    }
+    SnapshotKind kind;
+    if (int32_t rc = checkObject(request->request, &kind))
+        return rc;
+
+    Served served;
+    if (int32_t rc = loadServed(kind, served))
+        return rc;
+    const SnapshotAnswer& shape = served.shape();
+    answer(ca, kSqlOk);
+    *request->estimate = 0;
+    if (shape.sizeRc != 0)
+        return shape.sizeRc;
+    if (int32_t rc = loadFileStream(served))
+        return rc;
+    if (int32_t code = refusal(served, shape.sizeSqlcode)) {
+        answer(ca, code);
+        return 0;
+    }
+    uint64_t size = streamSize(served, scopeOf(served));
+    *request->estimate =
+        shape.estimate ? *shape.estimate : static_cast<uint32_t>(std::min(size, kMaxBuffer));
+    return 0;
+}
+
+int32_t getSnapshot(uint32_t version, MonSnapshotRequest* request, sqlca* ca) {
+    if (version != VRX_MONITOR_VERSION)
+        return kMonBadInterfaceVersion;
+    if (request == nullptr || ca == nullptr)
+        return kMonBadArgument;
+    if (request->buffer == nullptr && request->bufferSize != 0)
+        return kMonBadArgument;
+    if (request->flags != 0)
+        return kMonBadArgument;
+    if (int32_t rc =
+            checkAddressing(request->streamVersion, request->partition, request->selector)) {
+        return rc;
+    }
+    SnapshotKind kind;
+    if (int32_t rc = checkObject(request->request, &kind))
+        return rc;
+
+    Served served;
+    if (int32_t rc = loadServed(kind, served))
+        return rc;
+    const SnapshotAnswer& shape = served.shape();
+    answer(ca, kSqlOk);
+    if (shape.takeRc != 0)
+        return shape.takeRc;
+    if (int32_t rc = loadFileStream(served))
+        return rc;
+    if (int32_t code = refusal(served, shape.takeSqlcode)) {
+        answer(ca, code);
+        return 0;
+    }
+    StreamScope scope = scopeOf(served);
+    uint64_t size = streamSize(served, scope);
+    if (forcedTooSmall(served) || size > request->bufferSize) {
+        answer(ca, SQLC_BUFFER_TOO_SMALL);
+        return 0;
+    }
+    auto* out = static_cast<char*>(request->buffer);
+    if (served.fileStream) {
+        if (size != 0)
+            std::memcpy(out, served.fileStream->data(), size);
+    } else {
+        encodeStream(served.instance, scope, out);
+    }
+    if (request->output != nullptr) {
+        std::memset(request->output, 0, sizeof(*request->output));
+        request->output->bytesWritten = static_cast<uint32_t>(size);
+        request->output->objectsWritten = 1;
+    }
+    if (request->engineWord != nullptr)
+        *request->engineWord = static_cast<uint32_t>(size);
+    return 0;
+}
+
+}  // namespace
+
+}  // namespace standin
+
+extern "C" __attribute__((visibility("default"))) int32_t vrxGetSnapshotSize(
+    uint32_t version, MonSizeRequest* request, sqlca* ca) {
+    return standin::getSnapshotSize(version, request, ca);
+}
+
+extern "C" __attribute__((visibility("default"))) int32_t vrxGetSnapshot(
+    uint32_t version, MonSnapshotRequest* request, sqlca* ca) {
+    return standin::getSnapshot(version, request, ca);
+}
