@@ -2,6 +2,7 @@
 // <instance directory>/instance.json.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <filesystem>
 #include <optional>
@@ -88,16 +89,32 @@ struct Instance {
 // built-in demo instance.
 std::filesystem::path instanceDirectory();
 
+// The same path as a C string in `out` (capacity `capacity`), for the paths
+// that must not allocate (the registry write and the trace probes, which a
+// signal handler calls). False, with `out` empty, when it does not fit.
+bool instanceDirectoryPath(char* out, size_t capacity);
+
 // Reads and validates <dir>/instance.json. On failure returns false and
 // `error` says exactly what is wrong (file, line and column for bad JSON).
 bool loadInstance(const std::filesystem::path& dir, Instance& out, std::string& error);
+
+// The same for the text of an instance.json.
+bool parseInstance(const std::string& content, Instance& out, std::string& error);
 
 // The instance as the system services see it: loaded on first use and again
 // whenever the instance directory or its instance.json changes (path, size,
 // modification time), so that a process that switches VRX_INSTANCE_DIR, or
 // an edited file, is followed. The defaults when the file cannot be read or
-// is not valid. Not for signal handlers.
+// is not valid. The reference stays valid across one further reload, so
+// holding it while calling another service is safe. Not for signal handlers.
 const Instance& currentInstance();
+
+// faults.registryWrite of the instance in `dir`, for the registry write that
+// a signal handler makes: answered without allocating or locking when
+// instance.json is the file currentInstance() last loaded, or when it does
+// not mention the fault at all. Only a file changed since then that does
+// configure the fault is loaded the ordinary way.
+std::optional<int32_t> registryWriteFault(const char* dir);
 
 // The engine's installed data (catalogs under locale/, the demo instance
 // under demo/): found relative to the library that asks, so that the build

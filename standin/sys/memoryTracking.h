@@ -7,6 +7,10 @@
 
 namespace standin {
 
+// Results of sqlogmblkEx and sqlofmblkEx besides 0.
+constexpr int32_t kMemoryNotAvailable = static_cast<int32_t>(0x870F0030);  // refused or failed
+constexpr int32_t kMemoryBadBlock = static_cast<int32_t>(0x870F0031);  // not held, or no pointer
+
 // The size that was asked for when `block` was handed out by sqlogmblkEx,
 // or nothing when the block is not currently held (never handed out, or
 // already released). Lets a service bound its reads of a caller's table.

@@ -1,0 +1,169 @@
+#include <fcntl.h>
+#include <limits.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cerrno>
+#include <cstring>
+#include <ctime>
+#include <memory>
+#include <mutex>
+
+#include "common/fixedText.h"
+#include "common/instance.h"
+
+namespace standin {
+
+namespace {
+
+struct Cache {
+    bool loaded = false;
+    std::filesystem::path dir;
+    bool fileExists = false;
+    struct stat fileStat {};
+    std::string content;
+    // The answer before the last reload stays alive too, so that a reference
+    // taken by a caller survives a reload triggered by a service it calls.
+    std::unique_ptr<Instance> instance = std::make_unique<Instance>();
+    std::unique_ptr<Instance> previous;
+};
+
+bool sameFile(const struct stat& a, const struct stat& b) {
+    return a.st_dev == b.st_dev && a.st_ino == b.st_ino && a.st_size == b.st_size &&
+           a.st_mtim.tv_sec == b.st_mtim.tv_sec && a.st_mtim.tv_nsec == b.st_mtim.tv_nsec &&
+           a.st_ctim.tv_sec == b.st_ctim.tv_sec && a.st_ctim.tv_nsec == b.st_ctim.tv_nsec;
+}
+
+// File times tick in steps of a few milliseconds, so two writes of the same
+// size within one step look alike. A file changed that recently is compared
+// by content as well; any older file is settled by its stat alone.
+bool recentlyChanged(const struct stat& st) {
+    timespec now{};
+    clock_gettime(CLOCK_REALTIME, &now);
+    return now.tv_sec - st.st_ctim.tv_sec < 2;
+}
+
+std::string readAll(const std::filesystem::path& file) {
+    std::string content;
+    if (FILE* f = std::fopen(file.c_str(), "rb")) {
+        char buffer[16384];
+        size_t n;
+        while ((n = std::fread(buffer, 1, sizeof buffer, f)) > 0)
+            content.append(buffer, n);
+        std::fclose(f);
+    }
+    return content;
+}
+
+// What a signal handler may learn about the instance without reading files:
+// the registry write fault of the instance.json last loaded, with the file's
+// identity at that time. Two slots, so that a handler interrupting a publish
+// still reads a whole one.
+struct Published {
+    char dir[PATH_MAX];
+    bool exists;
+    struct stat fileStat;
+    std::optional<int32_t> registryWrite;
+};
+Published gPublished[2];
+std::atomic<int> gPublishedSlot{-1};
+
+void publish(const std::filesystem::path& dir, bool exists, const struct stat& st,
+             const Instance& instance) {
+    if (dir.native().size() >= PATH_MAX)
+        return;
+    int slot = gPublishedSlot.load() == 0 ? 1 : 0;
+    Published& p = gPublished[slot];
+    std::memcpy(p.dir, dir.c_str(), dir.native().size() + 1);
+    p.exists = exists;
+    p.fileStat = st;
+    p.registryWrite = instance.faults.registryWrite;
+    gPublishedSlot.store(slot);
+}
+
+// Whether the file names `word` anywhere, read in stack-sized chunks.
+bool fileMentions(const char* path, const char* word) {
+    int fd = open(path, O_RDONLY | O_CLOEXEC);
+    if (fd < 0)
+        return false;
+    size_t wordLength = std::strlen(word);
+    char chunk[4096];
+    size_t kept = 0;  // bytes carried over from the previous chunk
+    bool found = false;
+    for (;;) {
+        ssize_t n = read(fd, chunk + kept, sizeof chunk - kept);
+        if (n < 0 && errno == EINTR)
+            continue;
+        if (n <= 0)
+            break;
+        size_t size = kept + static_cast<size_t>(n);
+        for (size_t i = 0; !found && i + wordLength <= size; ++i) {
+            found = std::memcmp(chunk + i, word, wordLength) == 0;
+        }
+        if (found)
+            break;
+        kept = size < wordLength - 1 ? size : wordLength - 1;
+        std::memmove(chunk, chunk + size - kept, kept);
+    }
+    close(fd);
+    return found;
+}
+
+}  // namespace
+
+std::optional<int32_t> registryWriteFault(const char* dir) {
+    char file[PATH_MAX + 32];
+    FixedText path(file, sizeof file);
+    path.add(dir).add("/instance.json");
+    if (path.overflow())
+        return std::nullopt;
+    struct stat st {};
+    bool exists = stat(file, &st) == 0;
+    int slot = gPublishedSlot.load();
+    if (slot >= 0) {
+        const Published& p = gPublished[slot];
+        if (std::strcmp(p.dir, dir) == 0 && p.exists == exists &&
+            (!exists || sameFile(p.fileStat, st))) {
+            return p.registryWrite;
+        }
+    }
+    if (!exists || !fileMentions(file, "registryWrite"))
+        return std::nullopt;
+    return currentInstance().faults.registryWrite;
+}
+
+const Instance& currentInstance() {
+    // Never destroyed: services may still be called from other libraries'
+    // destructors while this one's statics are already gone.
+    static Cache& cache = *new Cache;
+    static std::mutex& mutex = *new std::mutex;
+    std::lock_guard lock(mutex);
+
+    std::filesystem::path dir = instanceDirectory();
+    std::filesystem::path file = dir / "instance.json";
+    struct stat st {};
+    bool exists = stat(file.c_str(), &st) == 0;
+    bool unchanged = cache.loaded && cache.dir == dir && cache.fileExists == exists &&
+                     (!exists || sameFile(cache.fileStat, st));
+    if (unchanged && exists && recentlyChanged(st))
+        unchanged = readAll(file) == cache.content;
+    if (unchanged)
+        return *cache.instance;
+
+    cache.loaded = true;
+    cache.dir = dir;
+    cache.fileExists = exists;
+    cache.fileStat = st;
+    cache.content = exists ? readAll(file) : std::string();
+    auto instance = std::make_unique<Instance>();
+    std::string error;
+    if (!exists || !parseInstance(cache.content, *instance, error))
+        *instance = Instance{};
+    cache.previous = std::move(cache.instance);
+    cache.instance = std::move(instance);
+    publish(dir, exists, st, *cache.instance);
+    return *cache.instance;
+}
+
+}  // namespace standin
