@@ -1,0 +1,142 @@
+// sqlogmsg: inserts, the caller's buffer and the failures it answers.
+#include <cstring>
+
+#include "catalogFiles.h"
+#include "engine/vrxsys.h"
+
+namespace mtrktest {
+namespace {
+
+class CatalogInsertTest : public MessageTest {};
+
+TEST_F(CatalogInsertTest, InsertsAreReplacedInOnePass) {
+    struct Case {
+        const char* text;
+        std::vector<std::string> inserts;
+        const char* expected;
+    };
+    const Case cases[] = {
+        {"on %1 at %2", {"2026/12/06", "20:05:39"}, "on 2026/12/06 at 20:05:39"},
+        {"%2 before %1", {"one", "two"}, "two before one"},
+        {"%1%1%1", {"ab"}, "ababab"},
+        // An insert's own text is never read as a placeholder.
+        {"[%1] [%2]", {"%2", "%1"}, "[%2] [%1]"},
+        {"[%1]", {"100%%"}, "[100%%]"},
+        {"100%% of %1", {"pool"}, "100% of pool"},
+        {"%%1 is no placeholder", {"x"}, "%1 is no placeholder"},
+        {"%%%1", {"x"}, "%x"},
+        // Only %1 and %2 are placeholders.
+        {"%3 %0 %a %", {"x", "y"}, "%3 %0 %a %"},
+        {"ends in %", {}, "ends in %"},
+        // A placeholder without an insert becomes the empty text.
+        {"[%1] [%2]", {"only"}, "[only] []"},
+        {"[%1] [%2]", {}, "[] []"},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.text);
+        // A catalog of its own per row, so that no cached one answers.
+        std::string name = "probe" + std::to_string(&c - cases) + ".mo";
+        instanceCatalog(name, {{"7", c.text}});
+        EXPECT_EQ(fetch(name, 7, c.inserts).text, c.expected);
+    }
+}
+
+TEST_F(CatalogInsertTest, LengthTableBoundsEachInsert) {
+    instanceCatalog("probe.mo", {{"7", "[%1] [%2]"}});
+    const char* inserts[2] = {"abcdef", "ghi"};
+    const uint64_t lengths[2] = {3, 100};
+    char buffer[64];
+    int32_t rc = sqlogmsg("probe.mo", 7, lengths, inserts, buffer, sizeof buffer, nullptr, 0,
+                          nullptr, nullptr);
+    EXPECT_EQ(rc, 11);
+    // The first insert is cut at its given length; the second ends at its
+    // terminator although its length says more.
+    EXPECT_STREQ(buffer, "[abc] [ghi]");
+}
+
+TEST_F(CatalogInsertTest, NoEntryBeyondTheAllocatedTablesIsRead) {
+    // A one-entry table from sqlogmblkEx is all the caller handed over; the
+    // entry after it is never looked at, even when the text names %2. In the
+    // sanitizer build a read past the block stops the test; elsewhere the
+    // heap bytes after it would show up in the text or crash.
+    instanceCatalog("probe.mo", {{"7", "[%1] [%2]"}});
+    void* lengthBlock = nullptr;
+    void* pointerBlock = nullptr;
+    ASSERT_EQ(sqlogmblkEx(0, sizeof(uint64_t), 0, &lengthBlock, "catalogtest", __LINE__, 0), 0);
+    ASSERT_EQ(sqlogmblkEx(0, sizeof(char*), 0, &pointerBlock, "catalogtest", __LINE__, 0), 0);
+    static_cast<uint64_t*>(lengthBlock)[0] = 3;
+    static_cast<const char**>(pointerBlock)[0] = "one";
+    char buffer[64];
+    int32_t rc = sqlogmsg("probe.mo", 7, static_cast<uint64_t*>(lengthBlock),
+                          static_cast<const char* const*>(pointerBlock), buffer, sizeof buffer,
+                          nullptr, 0, nullptr, nullptr);
+    sqlofmblkEx("catalogtest", __LINE__, lengthBlock);
+    sqlofmblkEx("catalogtest", __LINE__, pointerBlock);
+    EXPECT_EQ(rc, 8);
+    EXPECT_STREQ(buffer, "[one] []");
+}
+
+TEST_F(CatalogInsertTest, NullTablesGiveEmptyInserts) {
+    instanceCatalog("probe.mo", {{"7", "[%1]"}});
+    char buffer[16];
+    EXPECT_EQ(sqlogmsg("probe.mo", 7, nullptr, nullptr, buffer, sizeof buffer, nullptr, 0, nullptr,
+                       nullptr),
+              2);
+    EXPECT_STREQ(buffer, "[]");
+}
+
+TEST_F(CatalogInsertTest, TextIsCutToTheBuffer) {
+    // "Größe" is G r ö(2 bytes) ß(2 bytes) e: 7 bytes.
+    instanceCatalog("probe.mo", {{"7", "abcdef"}, {"8", "Größe"}});
+    struct Case {
+        uint32_t number;
+        uint32_t bufferSize;
+        const char* expected;
+    };
+    const Case cases[] = {
+        {7, 7, "abcdef"},  // exactly the text and its terminator
+        {7, 6, "abcde"},   // one byte short: the last character goes
+        {7, 1, ""},       {8, 8, "Größe"}, {8, 7, "Größ"}, {8, 6, "Grö"},  // never half of ß
+        {8, 5, "Grö"},    {8, 4, "Gr"},                                    // never half of ö
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::to_string(c.number) + " into " + std::to_string(c.bufferSize));
+        auto result = fetch("probe.mo", c.number, {}, c.bufferSize);
+        EXPECT_EQ(result.text, c.expected);
+        EXPECT_EQ(result.rc, static_cast<int32_t>(std::strlen(c.expected)));
+    }
+}
+
+TEST_F(CatalogInsertTest, LongInsertIsCutWithTheText) {
+    instanceCatalog("probe.mo", {{"7", "name: %1!"}});
+    std::string longName(6000, 'n');
+    auto result = fetch("probe.mo", 7, {longName});
+    EXPECT_EQ(result.rc, 4999);
+    EXPECT_EQ(result.text, "name: " + longName.substr(0, 4993));
+}
+
+TEST_F(CatalogInsertTest, FailuresAnswerNegative) {
+    instanceCatalog("probe.mo", {{"7", "seven"}, {"8", "eight"}});
+    useInstanceJson(R"({"faults": {"messageFail": [8, 41]}})");
+    EXPECT_GT(fetch("probe.mo", 7).rc, 0);
+    EXPECT_LT(fetch("probe.mo", 8).rc, 0);
+    EXPECT_LT(fetch("vrxmtrk.mo", 41).rc, 0);
+    EXPECT_GT(fetch("vrxmtrk.mo", 42).rc, 0);
+
+    char buffer[8] = "garbage";
+    const char* none[1] = {nullptr};
+    const uint64_t zero[1] = {0};
+    EXPECT_LT(sqlogmsg(nullptr, 7, zero, none, buffer, sizeof buffer, nullptr, 0, nullptr, nullptr),
+              0);
+    EXPECT_LT(sqlogmsg("probe.mo", 7, zero, none, nullptr, 8, nullptr, 0, nullptr, nullptr), 0);
+    EXPECT_LT(sqlogmsg("probe.mo", 7, zero, none, buffer, 0, nullptr, 0, nullptr, nullptr), 0);
+    EXPECT_STREQ(buffer, "garbage") << "a buffer of size 0 must stay untouched";
+    // A failed fetch leaves an empty text, not the previous one.
+    EXPECT_LT(
+        sqlogmsg("probe.mo", 8, zero, none, buffer, sizeof buffer, nullptr, 0, nullptr, nullptr),
+        0);
+    EXPECT_STREQ(buffer, "");
+}
+
+}  // namespace
+}  // namespace mtrktest
