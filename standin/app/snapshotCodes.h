@@ -11,7 +11,8 @@ namespace standin {
 // The caller was built against another interface version than 9050000.
 constexpr int32_t kMonBadInterfaceVersion = -2101;
 // A null argument record, request, estimate word or sqlca, a buffer of
-// nonzero size at a null address, or a partition, selector or flag word
+// nonzero size at a null address, a nonzero byte in the part of the object
+// entry that belongs to the engine, or a partition, selector or flag word
 // that this engine does not serve (one partition, addressed as -1).
 constexpr int32_t kMonBadArgument = -2102;
 // A data stream version other than 7.

@@ -54,6 +54,13 @@ int32_t checkObject(const MonRequest* request, SnapshotKind* kind) {
         return kMonBadArgument;
     if (request->objectCount != 1)
         return kMonBadObjectCount;
+    // The rest of the object entry is the engine's: a client leaves it zero.
+    if (request->reserved != 0)
+        return kMonBadArgument;
+    for (uint8_t byte : request->engineArea) {
+        if (byte != 0)
+            return kMonBadArgument;
+    }
     switch (request->objectType) {
         case VRX_OBJ_INSTANCE:
             *kind = SnapshotKind::Instance;
