@@ -1,0 +1,110 @@
+// Setting up the client environment: the instance must be there and valid,
+// and what is wrong with it is said in its own log.
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <filesystem>
+#include <regex>
+#include <string>
+
+#include "engine/vrxapp.h"
+#include "testInstance.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+class InitTest : public ::testing::Test {
+  protected:
+    void SetUp() override { instance_.activate(); }
+    void TearDown() override { unsetenv("VRX_INSTANCE_DIR"); }
+
+    int32_t init() { return sqleInitApplicationEnvironment(0, 0, 1, nullptr); }
+
+    // The text of the only record in diag.log, which must be one the engine
+    // wrote about itself at `probe`.
+    std::string onlyEngineRecord(int probe) {
+        std::string log = instance_.diagLog();
+        std::smatch m;
+        std::regex record("\\S+ pid=\\d+ func=0x00000000 probe=" + std::to_string(probe) +
+                          "\n  data#1 text\\(\\d+\\): \"(.*)\"\n\n");
+        if (!std::regex_match(log, m, record))
+            return "unexpected log: " + log;
+        return m[1];
+    }
+
+    mtrktest::TempInstance instance_{false};
+};
+
+TEST_F(InitTest, AValidInstanceIsReady) {
+    EXPECT_EQ(init(), 0);
+    instance_.writeJson(R"({"state": "stopped", "pools": [{"name": "monh", "current": 1}]})");
+    EXPECT_EQ(init(), 0);
+    EXPECT_EQ(instance_.diagLog(), "");
+
+    sqlca ca;
+    std::memset(&ca, 0x55, sizeof ca);
+    EXPECT_EQ(sqleInitApplicationEnvironment(0, 0, 1, &ca), 0);
+    EXPECT_EQ(ca.sqlcode, 0);
+}
+
+TEST_F(InitTest, TheConfiguredResultIsAnswered) {
+    instance_.writeJson(R"({"faults": {"initApplicationEnvironment": 5}})");
+    EXPECT_EQ(init(), 5);
+    instance_.writeJson(R"({"faults": {"initApplicationEnvironment": "0xFFFFFFFF"}})");
+    EXPECT_EQ(init(), -1);
+    EXPECT_EQ(instance_.diagLog(), "");
+}
+
+TEST_F(InitTest, InvalidInstanceFilesFailWithTheReason) {
+    struct Case {
+        const char* json;
+        const char* record;
+    };
+    const Case cases[] = {
+        {R"({"databases": [{"name": "A"}, {"pools": [{"id": 1, "curent": 5}]}]})",
+         R"(instance.json: databases[1].pools[0]: unknown key \"curent\")"},
+        {"{\n  \"state\": \"stopped\"\n  \"pools\": []\n}",
+         R"(instance.json: line 3, column 9: syntax error while parsing object - unexpected string literal; expected '}')"},
+        {R"({"faults": {"initApplicationEnvironment": 5, "allocFailAt": 0}})",
+         "instance.json: faults.allocFailAt: calls are counted from 1"},
+    };
+    for (const Case& c : cases) {
+        fs::remove(instance_.dir() / "diag.log");
+        instance_.writeJson(c.json);
+        EXPECT_NE(init(), 0) << c.json;
+        EXPECT_EQ(onlyEngineRecord(20), c.record);
+    }
+}
+
+TEST_F(InitTest, AMissingInstanceFileFails) {
+    fs::remove(instance_.dir() / "instance.json");
+    EXPECT_NE(init(), 0);
+    EXPECT_EQ(onlyEngineRecord(20), "instance.json cannot be opened: No such file or directory");
+}
+
+TEST_F(InitTest, AMissingOrWrongDirectoryFails) {
+    setenv("VRX_INSTANCE_DIR", (instance_.dir() / "nothing").c_str(), 1);
+    EXPECT_NE(init(), 0);
+    EXPECT_FALSE(fs::exists(instance_.dir() / "nothing"));
+
+    instance_.writeFile("plain", "x");
+    setenv("VRX_INSTANCE_DIR", (instance_.dir() / "plain").c_str(), 1);
+    EXPECT_NE(init(), 0);
+}
+
+TEST_F(InitTest, AnUnreadableDirectoryFailsAndSaysSo) {
+    if (geteuid() == 0)
+        GTEST_SKIP() << "permissions do not bind the superuser";
+    fs::permissions(instance_.dir(), fs::perms::owner_write | fs::perms::owner_exec);
+    int32_t rc = init();
+    fs::permissions(instance_.dir(), fs::perms::owner_all);
+    EXPECT_NE(rc, 0);
+    EXPECT_EQ(onlyEngineRecord(10),
+              "instance directory " + instance_.dir().string() + ": Permission denied");
+}
+
+}  // namespace
