@@ -1,0 +1,375 @@
+// The stand-in's snapshot monitor through its C interface: the streams it
+// writes, the answers instance.json shapes, request checks and buffer bounds.
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "app/snapshotCodes.h"
+#include "engine/vrxapp.h"
+#include "monitor/mtrkStream.h"
+#include "streamBuilder.h"
+#include "testInstance.h"
+
+using mtrktest::StreamBuilder;
+using mtrktest::wrapStream;
+
+namespace {
+
+// The argument records of both calls as a well-behaved client fills them.
+struct Call {
+    explicit Call(uint32_t objectType) {
+        request.objectCount = 1;
+        request.objectType = objectType;
+        size.request = &request;
+        size.estimate = &estimate;
+        size.streamVersion = VRX_STREAM_VERSION;
+        size.partition = -1;
+        take.request = &request;
+        take.output = &output;
+        take.streamVersion = VRX_STREAM_VERSION;
+        take.partition = -1;
+        take.engineWord = &engineWord;
+    }
+    int32_t askSize() { return vrxGetSnapshotSize(VRX_MONITOR_VERSION, &size, &ca); }
+    // Takes into a buffer of `capacity` bytes followed by guard bytes; the
+    // buffer starts out filled with a pattern.
+    int32_t takeInto(uint32_t capacity) {
+        bytes.assign(capacity + kGuard, '\xA5');
+        take.buffer = bytes.data();
+        take.bufferSize = capacity;
+        return vrxGetSnapshot(VRX_MONITOR_VERSION, &take, &ca);
+    }
+    bool untouchedFrom(size_t offset) const {
+        return bytes.find_first_not_of('\xA5', offset) == std::string::npos;
+    }
+    std::string stream() const { return bytes.substr(0, take.bufferSize); }
+
+    static constexpr uint32_t kGuard = 16;
+    MonRequest request{};
+    MonSizeRequest size{};
+    MonSnapshotRequest take{};
+    MonSnapshotOutput output{};
+    uint32_t engineWord = 0;
+    uint32_t estimate = 0;
+    sqlca ca{};
+    std::string bytes;
+};
+
+// The whole stream of one snapshot, taken into a buffer of the estimate.
+std::string served(uint32_t objectType) {
+    Call call(objectType);
+    EXPECT_EQ(call.askSize(), 0);
+    EXPECT_EQ(call.ca.sqlcode, 0);
+    EXPECT_EQ(call.takeInto(call.estimate), 0);
+    EXPECT_EQ(call.ca.sqlcode, 0);
+    EXPECT_TRUE(call.untouchedFrom(call.estimate)) << "written past the buffer";
+    EXPECT_EQ(call.output.bytesWritten, call.estimate);
+    return call.stream();
+}
+
+class SnapshotMonitor : public ::testing::Test {
+  protected:
+    void SetUp() override { instance.activate(); }
+    mtrktest::TempInstance instance;
+};
+
+TEST_F(SnapshotMonitor, WritesTheStreamOfEachObjectType) {
+    struct Case {
+        std::string json;
+        uint32_t objectType;
+        std::string expected;
+    };
+    const std::vector<Case> cases = {
+        {R"({"pools": [{"id": 10, "current": 262144, "maximum": 1048576, "highWater": 327680},
+                       {"name": "bph", "maximum": "0xFFFFFFFFFFFFFFFF"}]})",
+         VRX_OBJ_INSTANCE,
+         wrapStream(StreamBuilder()
+                        .pool(10, 262144, 1048576, 327680)
+                        .open(40)
+                        .u32(686, 3)
+                        .u64(688, -1)
+                        .close()
+                        .str())},
+        {R"({"pools": []})", VRX_OBJ_INSTANCE, wrapStream("")},
+        {R"({"databases": [{"name": "SAMPLE", "pools": [
+                {"name": "bph", "bufferPool": "USERBP1", "current": 8650752}]},
+             {"name": "X", "pools": []}]})",
+         VRX_OBJ_DATABASE,
+         wrapStream(StreamBuilder()
+                        .open(13)
+                        .text(321, "SAMPLE")
+                        .pool(3, 8650752, std::nullopt, std::nullopt, "USERBP1")
+                        .close()
+                        .open(13)
+                        .text(321, "X")
+                        .close()
+                        .str())},
+        {R"({"applications": [{"number": 17, "database": "SAMPLE",
+                               "pools": [{"name": "apph", "current": 65536}]},
+                              {"number": 9, "database": "", "pools": []}],
+             "privateMemory": [{"number": 0, "pools": [{"id": 15, "highWater": 4}]}]})",
+         VRX_OBJ_APPLICATION,
+         wrapStream(StreamBuilder()
+                        .open(5)
+                        .u32(302, 17)
+                        .text(321, "SAMPLE")
+                        .pool(2, 65536)
+                        .close()
+                        .open(5)
+                        .u32(302, 9)
+                        .text(321, "")
+                        .close()
+                        .open(10)
+                        .u32(549, 0)
+                        .pool(15, std::nullopt, std::nullopt, 4)
+                        .close()
+                        .str())},
+    };
+    for (const Case& c : cases) {
+        instance.writeJson(c.json);
+        EXPECT_EQ(served(c.objectType), c.expected) << c.json;
+    }
+}
+
+// The pool identifiers of a stream or one element with its header, in
+// order, read back with the program's own search.
+std::vector<uint32_t> poolIds(const std::string& stream) {
+    std::vector<uint32_t> ids;
+    const char* start = stream.data();
+    uint32_t length = mtrkStreamLength(stream.data(), static_cast<uint32_t>(stream.size()));
+    const char* header;
+    const char* data;
+    uint32_t remaining;
+    uint32_t size;
+    while (mtrkFindNextPool(start, length, &header, &data, &remaining, &size) == 0) {
+        uint32_t id = 0;
+        EXPECT_EQ(mtrkGetPoolId(data, size, &id), 0);
+        ids.push_back(id);
+        start = header;
+        length = remaining;
+    }
+    return ids;
+}
+
+TEST_F(SnapshotMonitor, TheProgramsSearchReadsTheStreamBack) {
+    instance.writeJson(R"({"applications": [
+        {"number": 1, "database": "A", "pools": [{"id": 2, "current": 100, "maximum": -7}]},
+        {"number": 2, "database": "B", "pools": []},
+        {"number": 3, "database": "A", "pools": [{"id": 1, "current": 5}, {"id": 0, "current": 6}]}],
+        "privateMemory": [{"number": 4, "pools": [{"id": 11, "current": 1}]}]})");
+    std::string stream = served(VRX_OBJ_APPLICATION);
+    const char* start = stream.data();
+    uint32_t length = mtrkStreamLength(stream.data(), static_cast<uint32_t>(stream.size()));
+    const char* header;
+    const char* data;
+    uint32_t remaining;
+    std::vector<std::string> seen;
+    while (mtrkFindNextElement(start, length, &header, &data, &remaining, 5) == 0) {
+        uint32_t number = 0;
+        char name[16] = "";
+        uint32_t size = mtrkReadHeader(header).size;
+        EXPECT_EQ(mtrkGetU32(302, data, size, &number), 0);
+        EXPECT_EQ(mtrkGetString(321, data, size, name, sizeof(name)), 0);
+        seen.push_back(std::to_string(number) + name +
+                       std::to_string(poolIds(std::string(header, size + 8)).size()));
+        start = data;
+        length = remaining;
+    }
+    EXPECT_EQ(seen, (std::vector<std::string>{"1A1", "2B0", "3A2"}));
+    int64_t maximum = 0;
+    ASSERT_EQ(mtrkGetPoolMaximum(stream.data(), static_cast<uint32_t>(stream.size()), &maximum), 0);
+    EXPECT_EQ(maximum, -7);
+    uint32_t section = 99;
+    EXPECT_EQ(mtrkGetU32(549, stream.data(), static_cast<uint32_t>(stream.size()), &section), 0);
+    EXPECT_EQ(section, 4u);
+}
+
+TEST_F(SnapshotMonitor, InternalPoolsShowOnlyWhenTheRegistrySaysSo) {
+    instance.writeJson(R"({"pools": [{"id": 3, "current": 1}, {"id": 19, "current": 1},
+                                     {"id": 21, "current": 1}, {"id": 45, "current": 1}]})");
+    const std::vector<uint32_t> standard = {3};
+    const std::vector<uint32_t> all = {3, 19, 21, 45};
+    const std::pair<const char*, std::vector<uint32_t>> cases[] = {
+        {"", standard},
+        {"VRXMEMTRK=1\n", all},
+        {"VRXMEMTRK=0\n", standard},
+        {"VRXMEMTRK@0=1\n", standard},
+        {"OTHER=1\nVRXMEMTRK=1\n", all},
+    };
+    for (const auto& [registry, ids] : cases) {
+        instance.writeFile("registry", registry);
+        EXPECT_EQ(poolIds(served(VRX_OBJ_INSTANCE)), ids) << registry;
+    }
+}
+
+TEST_F(SnapshotMonitor, AnswersAsInstanceJsonShapesThem) {
+    struct Case {
+        std::string json;
+        uint32_t objectType;
+        int32_t sizeRc, sizeCode, takeRc, takeCode;
+    };
+    const std::string db = R"("databases": [{"name": "A", "pools": []}])";
+    const std::vector<Case> cases = {
+        {"{" + db + R"(, "state": "stopped"})", VRX_OBJ_DATABASE, 0, -1032, 0, -1032},
+        {"{" + db + R"(, "state": "unauthorized"})", VRX_OBJ_INSTANCE, 0, -1092, 0, -1092},
+        {R"({"pools": []})", VRX_OBJ_DATABASE, 0, 1611, 0, 1611},
+        {"{" + db + "}", VRX_OBJ_APPLICATION, 0, 1611, 0, 1611},
+        {R"({"privateMemory": [{"number": 0, "pools": []}]})", VRX_OBJ_APPLICATION, 0, 0, 0, 0},
+        {R"({"snapshots": {"instance": {"sizeRc": 9}}})", VRX_OBJ_INSTANCE, 9, 0, 0, 0},
+        {R"({"snapshots": {"instance": {"takeRc": -3}}})", VRX_OBJ_INSTANCE, 0, 0, -3, 0},
+        {R"({"snapshots": {"instance": {"sizeSqlcode": -901}}})", VRX_OBJ_INSTANCE, 0, -901, 0, 0},
+        {R"({"snapshots": {"instance": {"takeSqlcode": 1606}}})", VRX_OBJ_INSTANCE, 0, 0, 0, 1606},
+        {R"({"snapshots": {"database": {"sizeSqlcode": 1606}}})", VRX_OBJ_INSTANCE, 0, 0, 0, 0},
+    };
+    for (const Case& c : cases) {
+        instance.writeJson(c.json);
+        Call call(c.objectType);
+        EXPECT_EQ(call.askSize(), c.sizeRc) << c.json;
+        EXPECT_EQ(call.ca.sqlcode, c.sizeCode) << c.json;
+        EXPECT_EQ(call.takeInto(4096), c.takeRc) << c.json;
+        if (c.takeRc == 0) {
+            EXPECT_EQ(call.ca.sqlcode, c.takeCode) << c.json;
+        }
+        if (c.takeRc != 0 || c.takeCode != 0) {
+            EXPECT_TRUE(call.untouchedFrom(0)) << c.json << ": nothing written on a refusal";
+        }
+    }
+}
+
+TEST_F(SnapshotMonitor, EstimateAndTooSmall) {
+    instance.writeJson(R"({"pools": [{"id": 1, "current": 2}],
+                           "snapshots": {"instance": {"estimate": 3, "tooSmall": 2}}})");
+    Call call(VRX_OBJ_INSTANCE);
+    ASSERT_EQ(call.askSize(), 0);
+    EXPECT_EQ(call.estimate, 3u);
+    const uint32_t streamSize = 8 + 8 + 12 + 16;
+    // The first two takes answer 1606 whatever the buffer; after them only
+    // a buffer smaller than the stream does.
+    const std::pair<uint32_t, int32_t> takes[] = {
+        {4096, 1606}, {4096, 1606}, {streamSize - 1, 1606}, {streamSize, 0}, {0, 1606}};
+    for (const auto& [capacity, code] : takes) {
+        ASSERT_EQ(call.takeInto(capacity), 0);
+        EXPECT_EQ(call.ca.sqlcode, code) << capacity;
+        EXPECT_TRUE(call.untouchedFrom(code == 0 ? capacity : 0)) << capacity;
+    }
+    // Counted per object type: the instance's two do not use up the
+    // database's one.
+    instance.writeJson(R"({"databases": [{"name": "A", "pools": []}],
+                           "snapshots": {"instance": {"tooSmall": 2},
+                                         "database": {"tooSmall": 1}}})");
+    EXPECT_FALSE(served(VRX_OBJ_INSTANCE).empty());
+    Call database(VRX_OBJ_DATABASE);
+    for (int32_t code : {1606, 0}) {
+        ASSERT_EQ(database.takeInto(4096), 0);
+        EXPECT_EQ(database.ca.sqlcode, code);
+    }
+
+    Call noBuffer(VRX_OBJ_INSTANCE);
+    noBuffer.take.bufferSize = 0;
+    ASSERT_EQ(vrxGetSnapshot(VRX_MONITOR_VERSION, &noBuffer.take, &noBuffer.ca), 0);
+    EXPECT_EQ(noBuffer.ca.sqlcode, 1606);
+}
+
+TEST_F(SnapshotMonitor, ServesAStreamFileAsItStands) {
+    std::string damaged = StreamBuilder().raw(1, 1, 1000, "not a stream").str();
+    instance.writeFile("bad.bin", damaged);
+    instance.writeJson(R"({"snapshots": {"database": {"streamFile": "bad.bin"}}})");
+    EXPECT_EQ(served(VRX_OBJ_DATABASE), damaged) << "the 1611 rule does not apply";
+
+    instance.writeJson(
+        R"({"state": "stopped", "snapshots": {"database": {"streamFile": "bad.bin"}}})");
+    Call stopped(VRX_OBJ_DATABASE);
+    ASSERT_EQ(stopped.askSize(), 0);
+    EXPECT_EQ(stopped.ca.sqlcode, -1032);
+
+    instance.writeJson(R"({"snapshots": {"database": {"streamFile": "missing.bin"}}})");
+    Call missing(VRX_OBJ_DATABASE);
+    EXPECT_EQ(missing.askSize(), standin::kMonInstanceUnreadable);
+    EXPECT_NE(instance.diagLog().find("missing.bin"), std::string::npos);
+}
+
+TEST_F(SnapshotMonitor, RefusesMalformedRequests) {
+    using namespace standin;
+    struct Case {
+        const char* name;
+        void (*spoil)(Call&);
+        int32_t sizeRc;  // 0: the case concerns the take only
+        int32_t takeRc;
+    };
+    const Case cases[] = {
+        {"count 0", [](Call& c) { c.request.objectCount = 0; }, kMonBadObjectCount,
+         kMonBadObjectCount},
+        {"count 2", [](Call& c) { c.request.objectCount = 2; }, kMonBadObjectCount,
+         kMonBadObjectCount},
+        {"type", [](Call& c) { c.request.objectType = 0x10002; }, kMonBadObjectType,
+         kMonBadObjectType},
+        {"engine area", [](Call& c) { c.request.engineArea[35] = 1; }, kMonBadArgument,
+         kMonBadArgument},
+        {"second word", [](Call& c) { c.request.reserved = 1; }, kMonBadArgument, kMonBadArgument},
+        {"stream version", [](Call& c) { c.size.streamVersion = c.take.streamVersion = 6; },
+         kMonBadStreamVersion, kMonBadStreamVersion},
+        {"partition", [](Call& c) { c.size.partition = c.take.partition = 0; }, kMonBadArgument,
+         kMonBadArgument},
+        {"selector", [](Call& c) { c.size.selector = c.take.selector = 1; }, kMonBadArgument,
+         kMonBadArgument},
+        {"no request", [](Call& c) { c.size.request = c.take.request = nullptr; }, kMonBadArgument,
+         kMonBadArgument},
+        {"no estimate word", [](Call& c) { c.size.estimate = nullptr; }, kMonBadArgument, 0},
+        {"flags", [](Call& c) { c.take.flags = 1; }, 0, kMonBadArgument},
+    };
+    instance.writeJson(R"({"databases": [{"name": "A", "pools": []}]})");
+    for (const Case& c : cases) {
+        Call call(VRX_OBJ_DATABASE);
+        c.spoil(call);
+        EXPECT_EQ(vrxGetSnapshotSize(VRX_MONITOR_VERSION, &call.size, &call.ca), c.sizeRc)
+            << c.name;
+        std::string buffer(64, '\xA5');
+        call.take.buffer = buffer.data();
+        call.take.bufferSize = 64;
+        EXPECT_EQ(vrxGetSnapshot(VRX_MONITOR_VERSION, &call.take, &call.ca), c.takeRc) << c.name;
+        if (c.takeRc != 0) {
+            EXPECT_EQ(buffer, std::string(64, '\xA5')) << c.name;
+        }
+    }
+
+    Call call(VRX_OBJ_DATABASE);
+    EXPECT_EQ(vrxGetSnapshotSize(9050001, &call.size, &call.ca), kMonBadInterfaceVersion);
+    EXPECT_EQ(vrxGetSnapshot(0, &call.take, &call.ca), kMonBadInterfaceVersion);
+    EXPECT_EQ(vrxGetSnapshotSize(VRX_MONITOR_VERSION, nullptr, &call.ca), kMonBadArgument);
+    EXPECT_EQ(vrxGetSnapshotSize(VRX_MONITOR_VERSION, &call.size, nullptr), kMonBadArgument);
+    EXPECT_EQ(vrxGetSnapshot(VRX_MONITOR_VERSION, nullptr, &call.ca), kMonBadArgument);
+    call.take.bufferSize = 10;
+    EXPECT_EQ(vrxGetSnapshot(VRX_MONITOR_VERSION, &call.take, &call.ca), kMonBadArgument)
+        << "a null buffer of 10 bytes";
+
+    instance.writeJson(R"({"databases": [{"name": "A", "pools": [{"curent": 1}]}]})");
+    EXPECT_EQ(call.askSize(), kMonInstanceUnreadable);
+    EXPECT_NE(instance.diagLog().find("snapshot monitor: "), std::string::npos);
+}
+
+TEST_F(SnapshotMonitor, AnswersInAClearedSqlcaAndReadsTheInstanceAfresh) {
+    instance.writeJson(R"({"pools": [{"id": 1, "current": 2}]})");
+    Call call(VRX_OBJ_INSTANCE);
+    std::memset(&call.ca, 0xEE, sizeof(call.ca));
+    ASSERT_EQ(call.askSize(), 0);
+    ASSERT_EQ(call.takeInto(call.estimate), 0);
+    const auto* bytes = reinterpret_cast<const unsigned char*>(&call.ca);
+    EXPECT_EQ(std::string(call.ca.sqlcaid, 8), "SQLCA   ");
+    EXPECT_EQ(call.ca.sqlcabc, 136);
+    for (size_t i = 12; i < sizeof(sqlca); ++i)
+        EXPECT_EQ(bytes[i], 0) << "byte " << i;
+
+    std::string before = served(VRX_OBJ_INSTANCE);
+    instance.writeJson(R"({"pools": [{"id": 1, "current": 3}]})");
+    std::string after = served(VRX_OBJ_INSTANCE);
+    int64_t current = 0;
+    ASSERT_EQ(mtrkGetPoolCurrentSize(after.data(), static_cast<uint32_t>(after.size()), &current),
+              0);
+    EXPECT_EQ(current, 3);
+    EXPECT_NE(before, after);
+}
+
+}  // namespace
