@@ -55,7 +55,12 @@ void appendColumn(char* line, const char* text) {
     if (used >= MTRK_LINE_SIZE) {
         return;
     }
-    strncpy(line + used, text, MTRK_LINE_SIZE - used);
+    size_t room = MTRK_LINE_SIZE - used;
+    size_t length = strnlen(text, room);
+    memcpy(line + used, text, length);
+    if (length < room) {
+        line[used + length] = '\0';
+    }
     line[MTRK_LINE_SIZE - 1] = '\0';
 }
 
