@@ -160,15 +160,6 @@ TEST_F(PoolPrinterTest, VerboseLinesShowTheSelectedSizeAndATotal) {
     }
 }
 
-TEST_F(PoolPrinterTest, ColumnsShowTheSelectedSize) {
-    std::string stream = wrapStream(StreamBuilder().pool(12, 100, 2048, 3072).str());
-    options_.maximum = 1;
-    EXPECT_EQ(printList(stream), "   pckcacheh   \n   2.0K        \n\n");
-    options_ = MtrkOptions{};
-    options_.highWater = 1;
-    EXPECT_EQ(printList(stream), "   pckcacheh   \n   3.0K        \n\n");
-}
-
 TEST_F(PoolPrinterTest, PoolsAboveTheHighestIdentifierAreSkipped) {
     // Identifier 60 lies above the engine's 52; it lacks even its size.
     std::string stream =
@@ -328,11 +319,15 @@ TEST_F(PoolPrinterTest, DatabasePoolPassesOverOtherPools) {
     EXPECT_EQ(total, 3000);
 }
 
-TEST_F(PoolPrinterTest, TotalLine) {
-    std::string out;
-    out = mtrktest::captureStdout([&] { rc_ = mtrkPrintTotal(-5); });
-    EXPECT_EQ(out, "total [-5]\n\n");
+TEST_F(PoolPrinterTest, DatabasePoolAboveTheHighestIdentifierIsNotPrinted) {
+    instance_.writeJson(R"({"maxPoolId": 11})");
+    StreamBuilder b;
+    b.open(13).text(321, "SAMPLE").pool(20, 3000).close();
+    int64_t total = -1;
+    options_.verbose = 1;
+    EXPECT_EQ(printDatabasePool(wrapStream(b.str()), "SAMPLE", &total), "");
     EXPECT_EQ(rc_, 0);
+    EXPECT_EQ(total, 0);
 }
 
 }  // namespace
