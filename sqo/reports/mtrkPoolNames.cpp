@@ -18,7 +18,7 @@ struct SystemBufferPool {
 };
 
 // The engine's four system buffer pools, in the order they are compared.
-constexpr SystemBufferPool kSystemBufferPools[] = {
+constexpr SystemBufferPool SYSTEM_BUFFER_POOLS[] = {
     {"System 32k buffer pool", "S32K"},
     {"System 16k buffer pool", "S16K"},
     {"System 8k buffer pool", "S8K"},
@@ -28,9 +28,9 @@ constexpr SystemBufferPool kSystemBufferPools[] = {
 // Unit letters after the first division by 1024. P and E go beyond what a
 // pool of today reaches, but a size of 1000 T or more must still read as a
 // size with its unit and never as a bare number of bytes.
-constexpr char kUnitLetters[] = {'K', 'M', 'G', 'T', 'P', 'E'};
+constexpr char UNIT_LETTERS[] = {'K', 'M', 'G', 'T', 'P', 'E'};
 
-constexpr float kOneOver1024 = 0.0009765625f;
+constexpr float ONE_OVER_1024 = 0.0009765625f;
 
 // Copies `text` into `buffer` of `capacity` bytes, cut to fit.
 void copyBounded(char* buffer, uint32_t capacity, const char* text) {
@@ -55,7 +55,7 @@ int32_t mtrkGetBufferPoolShortName(const char* start, uint32_t length, char* buf
     // Only the whole name of a system buffer pool is abbreviated: a user
     // buffer pool called "System" or "S" keeps its own name instead of
     // turning into another pool's short name.
-    for (const SystemBufferPool& pool : kSystemBufferPools) {
+    for (const SystemBufferPool& pool : SYSTEM_BUFFER_POOLS) {
         if (strncmp(buffer, pool.name, capacity) == 0) {
             copyBounded(buffer, capacity, pool.shortName);
             break;
@@ -85,15 +85,15 @@ void mtrkFormatSize(int64_t size, char* text) {
     }
     // Single precision on purpose: the column shows one decimal, and the
     // float's rounding decides where a value tips over into the next unit.
-    float value = static_cast<float>(size) * kOneOver1024;
+    float value = static_cast<float>(size) * ONE_OVER_1024;
     uint32_t divisions = 0;
     while (value >= 1000.0f) {
-        value *= kOneOver1024;
+        value *= ONE_OVER_1024;
         ++divisions;
     }
     // A signed 64-bit size stays below 8 E, so the letters always suffice;
     // the guard keeps a changed float behaviour from reading past them.
-    const uint32_t last = sizeof kUnitLetters - 1;
-    char unit = kUnitLetters[divisions <= last ? divisions : last];
+    const uint32_t last = sizeof UNIT_LETTERS - 1;
+    char unit = UNIT_LETTERS[divisions <= last ? divisions : last];
     ossSnprintf(text, MTRK_COLUMN_SIZE, "%3.1f%c          ", static_cast<double>(value), unit);
 }
