@@ -25,21 +25,17 @@ constexpr uint32_t kProbeDirectory = 10;
 constexpr uint32_t kProbeInstanceFile = 20;
 
 int32_t checkDirectory(const std::filesystem::path& dir) {
-    if (dir.empty()) {
-        standin::logEngineProblem(
-            "no instance directory: VRX_INSTANCE_DIR is not set and the "
-            "built-in demo instance was not found",
-            kProbeDirectory);
+    // Neither VRX_INSTANCE_DIR nor the built-in demo: there is no log to
+    // write to either.
+    if (dir.empty())
         return kInitNoInstance;
-    }
     struct stat st {};
-    std::string problem;
-    if (stat(dir.c_str(), &st) != 0) {
+    const char* problem;
+    if (stat(dir.c_str(), &st) != 0 ||
+        (S_ISDIR(st.st_mode) && access(dir.c_str(), R_OK | X_OK) != 0)) {
         problem = std::strerror(errno);
     } else if (!S_ISDIR(st.st_mode)) {
         problem = "not a directory";
-    } else if (access(dir.c_str(), R_OK | X_OK) != 0) {
-        problem = std::strerror(errno);
     } else {
         return 0;
     }

@@ -55,7 +55,7 @@ class FixedText {
         return add(digits, sizeof digits);
     }
 
-    const char* c_str() const { return buffer_; }
+    const char* text() const { return buffer_; }
     size_t length() const { return length_; }
     bool overflow() const { return overflow_; }
 

@@ -31,7 +31,7 @@ void appendTraceLine(const char* kind, uint32_t functionId, const int64_t* resul
         if (fd >= 0) {
             ssize_t written;
             do {
-                written = write(fd, line.c_str(), line.length());
+                written = write(fd, line.text(), line.length());
             } while (written < 0 && errno == EINTR);
             close(fd);
         }
