@@ -1,6 +1,7 @@
 // Setting up the client environment: the instance must be there and valid,
 // and what is wrong with it is said in its own log.
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <gtest/gtest.h>
@@ -96,11 +97,31 @@ TEST_F(InitTest, AMissingOrWrongDirectoryFails) {
     EXPECT_NE(init(), 0);
 }
 
+// Permissions do not bind the superuser, so a test run as root checks
+// this as an unprivileged user in a child process.
 TEST_F(InitTest, AnUnreadableDirectoryFailsAndSaysSo) {
-    if (geteuid() == 0)
-        GTEST_SKIP() << "permissions do not bind the superuser";
+    constexpr uid_t kNobody = 65534;
+    bool asRoot = geteuid() == 0;
+    if (asRoot) {
+        ASSERT_EQ(chown(instance_.dir().c_str(), kNobody, kNobody), 0);
+    }
     fs::permissions(instance_.dir(), fs::perms::owner_write | fs::perms::owner_exec);
-    int32_t rc = init();
+    int32_t rc = 0;
+    if (asRoot) {
+        pid_t pid = fork();
+        ASSERT_GE(pid, 0);
+        if (pid == 0) {
+            if (setgid(kNobody) != 0 || setuid(kNobody) != 0)
+                _exit(2);
+            _exit(init() != 0 ? 1 : 0);
+        }
+        int status = 0;
+        waitpid(pid, &status, 0);
+        ASSERT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) != 2) << "could not drop privileges";
+        rc = WEXITSTATUS(status);
+    } else {
+        rc = init();
+    }
     fs::permissions(instance_.dir(), fs::perms::owner_all);
     EXPECT_NE(rc, 0);
     EXPECT_EQ(onlyEngineRecord(10),
