@@ -53,8 +53,11 @@ size_t count(const std::string& haystack, const std::string& needle) {
     return n;
 }
 
-void setTraceWord(uint32_t word) {
+uint32_t setTraceWord(uint32_t word) {
+    uint32_t before;
+    std::memcpy(&before, g_sqltCompTraceFlags + VRX_TRACE_WORD_OFFSET, 4);
     std::memcpy(g_sqltCompTraceFlags + VRX_TRACE_WORD_OFFSET, &word, 4);
+    return before;
 }
 
 class SnapshotGetter : public ::testing::Test {
@@ -62,16 +65,17 @@ class SnapshotGetter : public ::testing::Test {
     void SetUp() override {
         instance.activate();
         gLastRc = 77;
-        setTraceWord(VRX_TRACE_ENTRY);
+        savedTraceWord = setTraceWord(VRX_TRACE_ENTRY);
     }
     void TearDown() override {
-        setTraceWord(0);
+        setTraceWord(savedTraceWord);
         mtrkReleaseSnapshot(&buffer);
     }
     // Number of snapshot attempts so far: each one starts with an estimate.
     size_t attempts() const { return count(instance.traceLog(), "entry 0x18780018\n"); }
 
     mtrktest::TempInstance instance;
+    uint32_t savedTraceWord = 0;
     char* buffer = nullptr;
     uint32_t size = 12345;
 };
