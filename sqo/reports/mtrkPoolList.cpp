@@ -56,7 +56,10 @@ void appendColumn(char* line, const char* text) {
         return;
     }
     size_t room = MTRK_LINE_SIZE - used;
-    size_t length = strnlen(text, room);
+    size_t length = 0;
+    while (length < room && text[length] != '\0') {
+        ++length;
+    }
     memcpy(line + used, text, length);
     if (length < room) {
         line[used + length] = '\0';
