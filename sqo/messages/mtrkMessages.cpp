@@ -27,7 +27,8 @@ int32_t mtrkGetMessage(uint32_t number, char* buffer, uint32_t bufferSize, int64
 
     int32_t rc = sqlogmblkEx(0, entries * sizeof(uint64_t), 0, reinterpret_cast<void**>(&lengths),
                              MTRK_SOURCE_FILE, __LINE__, 0);
-    if (rc != 0) {
+    // A block that did not come is a failed allocation, whatever the answer.
+    if (rc != 0 || lengths == nullptr) {
         lengths = nullptr;
         status = mtrkLogFailure(MTRK_FID_GET_MESSAGE, MTRK_PROBE_50,
                                 "Error in call to sqlogmblk.\nrc=", rc, true);
@@ -35,14 +36,14 @@ int32_t mtrkGetMessage(uint32_t number, char* buffer, uint32_t bufferSize, int64
     if (status == 0) {
         rc = sqlogmblkEx(0, entries * sizeof(const char*), 0, reinterpret_cast<void**>(&inserts),
                          MTRK_SOURCE_FILE, __LINE__, 0);
-        if (rc != 0) {
+        if (rc != 0 || inserts == nullptr) {
             inserts = nullptr;
             status = mtrkLogFailure(MTRK_FID_GET_MESSAGE, MTRK_PROBE_100,
                                     "Error in call to sqlogmblk.\nrc=", rc, true);
         }
     }
 
-    if (status == 0) {
+    if (status == 0 && lengths != nullptr && inserts != nullptr) {
         if (insertCount <= 0) {
             lengths[0] = 0;
             inserts[0] = nullptr;

@@ -117,7 +117,7 @@ TEST_F(SignalsTest, IgnoredSigpipeEndsTheRunThroughTheFailedWrite) {
 }
 
 TEST_F(SignalsTest, RepeatedInterruptsNeverLeaveTheVariableSet) {
-    constexpr int kRuns = 150;
+    constexpr int kRuns = 100;
     int interrupted = 0;
     for (int i = 0; i < kRuns; ++i) {
         const auto r = interruptAfterFirstOutput(SIGINT, true);
@@ -170,7 +170,7 @@ TEST_F(SignalsTest, InterruptsAtAnyMomentNeverLeaveTheVariableSet) {
         std::chrono::steady_clock::now() - start);
 
     // Every other run is a single repetition that reaches its shutdown.
-    constexpr int kRuns = 200;
+    constexpr int kRuns = 150;
     std::mt19937 random(12345);
     std::uniform_int_distribution<long> delay(0, span.count() + span.count() / 2);
     int interrupted = 0;
