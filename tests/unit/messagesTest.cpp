@@ -171,18 +171,4 @@ TEST_F(TraceTest, EachFlagBitWritesItsProbe) {
     }
 }
 
-TEST_F(TraceTest, ExitFollowsTheWordReadAtEntry) {
-    setFlags(0);
-    const uint32_t word = mtrkTraceEntry(0x1878002A);
-    setFlags(0x83);
-    mtrkTraceExit(0x1878002A, word, 0);
-    EXPECT_EQ(instance_.traceLog(), "");
-
-    setFlags(0x82);
-    const uint32_t second = mtrkTraceEntry(0x1878002A);
-    setFlags(0);
-    mtrkTraceExit(0x1878002A, second, -3);
-    EXPECT_EQ(instance_.traceLog(), "exit 0x1878002a rc=-3\nflight 0x1878002a rc=-3\n");
-}
-
 }  // namespace
