@@ -1,7 +1,4 @@
-#include <cstdio>
-
 #include "engine/vrxapp.h"
-#include "engine/vrxosse.h"
 #include "messages/mtrkFunctionIds.h"
 #include "messages/mtrkMessages.h"
 #include "messages/mtrkTrace.h"
@@ -107,20 +104,8 @@ int32_t printApplications(const char* stream, uint32_t streamLength, Application
 }  // namespace
 
 int32_t mtrkPrintApplicationHeading(const char* start, uint32_t length) {
-    char message[MTRK_TEXT_SIZE] = {};
-    char number[MTRK_NUMBER_SIZE] = {};
-    uint32_t traceFlags = mtrkTraceEntry(MTRK_FID_PRINT_APPLICATION_HEADING);
-    uint32_t applicationNumber = 0;
-    int32_t rc = mtrkGetU32(MON_APPLICATION_NUMBER, start, length, &applicationNumber);
-    if (rc == 0) {
-        ossSnprintf(number, sizeof number, "%u", applicationNumber);
-        rc = mtrkGetMessage(MSG_APPLICATION_HEADING, message, sizeof message, 1, number);
-        if (rc == 0) {
-            printf("%s\n\n", message);
-        }
-    }
-    mtrkTraceExit(MTRK_FID_PRINT_APPLICATION_HEADING, traceFlags, rc);
-    return rc;
+    return mtrkPrintNumberedHeading(MTRK_FID_PRINT_APPLICATION_HEADING, MON_APPLICATION_NUMBER,
+                                    MSG_APPLICATION_HEADING, start, length);
 }
 
 int32_t mtrkApplicationReport(const MtrkOptions* options) {

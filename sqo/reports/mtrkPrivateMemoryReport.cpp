@@ -1,7 +1,4 @@
-#include <cstdio>
-
 #include "engine/vrxapp.h"
-#include "engine/vrxosse.h"
 #include "messages/mtrkFunctionIds.h"
 #include "messages/mtrkMessages.h"
 #include "messages/mtrkTrace.h"
@@ -41,20 +38,9 @@ int32_t printSections(const char* stream, uint32_t streamLength, const MtrkOptio
 }  // namespace
 
 int32_t mtrkPrintPrivateMemoryHeading(const char* start, uint32_t length) {
-    char message[MTRK_TEXT_SIZE] = {};
-    char number[MTRK_NUMBER_SIZE] = {};
-    uint32_t traceFlags = mtrkTraceEntry(MTRK_FID_PRINT_PRIVATE_MEMORY_HEADING);
-    uint32_t sectionNumber = 0;
-    int32_t rc = mtrkGetU32(MON_PRIVATE_MEMORY_NUMBER, start, length, &sectionNumber);
-    if (rc == 0) {
-        ossSnprintf(number, sizeof number, "%u", sectionNumber);
-        rc = mtrkGetMessage(MSG_PRIVATE_MEMORY_HEADING, message, sizeof message, 1, number);
-        if (rc == 0) {
-            printf("%s\n\n", message);
-        }
-    }
-    mtrkTraceExit(MTRK_FID_PRINT_PRIVATE_MEMORY_HEADING, traceFlags, rc);
-    return rc;
+    return mtrkPrintNumberedHeading(MTRK_FID_PRINT_PRIVATE_MEMORY_HEADING,
+                                    MON_PRIVATE_MEMORY_NUMBER, MSG_PRIVATE_MEMORY_HEADING, start,
+                                    length);
 }
 
 int32_t mtrkPrivateMemoryReport(const MtrkOptions* options) {
