@@ -97,18 +97,22 @@ static bool mtrkStepOver(uint16_t id, const char** start, uint32_t* length) {
     return true;
 }
 
+// The walk that both find-next operations share: past the element at
+// `start` when it bears `id`, then a search of the rest of the region.
+static int32_t mtrkFindAfter(uint16_t id, const char* start, uint32_t length, const char** header,
+                             const char** data) {
+    if (!mtrkStepOver(id, &start, &length)) {
+        return 1;
+    }
+    return mtrkFindElement(id, start, length, header, data);
+}
+
 int32_t mtrkFindNextElement(const char* start, uint32_t length, const char** header,
                             const char** data, uint32_t* remaining, uint16_t id) {
     uint32_t traceFlags = mtrkTraceEntry(MTRK_FID_FIND_NEXT_ELEMENT);
-    const char* regionEnd = start + length;
-    const char* walkStart = start;
-    uint32_t walkLength = length;
-    int32_t rc = 1;
-    if (mtrkStepOver(id, &walkStart, &walkLength)) {
-        rc = mtrkFindElement(id, walkStart, walkLength, header, data);
-        if (rc == 0) {
-            *remaining = static_cast<uint32_t>(regionEnd - *data);
-        }
+    int32_t rc = mtrkFindAfter(id, start, length, header, data);
+    if (rc == 0) {
+        *remaining = static_cast<uint32_t>(start + length - *data);
     }
     mtrkTraceExit(MTRK_FID_FIND_NEXT_ELEMENT, traceFlags, rc);
     return rc;
@@ -117,16 +121,10 @@ int32_t mtrkFindNextElement(const char* start, uint32_t length, const char** hea
 int32_t mtrkFindNextPool(const char* start, uint32_t length, const char** header, const char** data,
                          uint32_t* remaining, uint32_t* size) {
     uint32_t traceFlags = mtrkTraceEntry(MTRK_FID_FIND_NEXT_POOL);
-    const char* regionEnd = start + length;
-    const char* walkStart = start;
-    uint32_t walkLength = length;
-    int32_t rc = 1;
-    if (mtrkStepOver(MON_POOL, &walkStart, &walkLength)) {
-        rc = mtrkFindElement(MON_POOL, walkStart, walkLength, header, data);
-        if (rc == 0) {
-            *remaining = static_cast<uint32_t>(regionEnd - *header);
-            *size = mtrkReadHeader(*header).size;
-        }
+    int32_t rc = mtrkFindAfter(MON_POOL, start, length, header, data);
+    if (rc == 0) {
+        *remaining = static_cast<uint32_t>(start + length - *header);
+        *size = mtrkReadHeader(*header).size;
     }
     mtrkTraceExit(MTRK_FID_FIND_NEXT_POOL, traceFlags, rc);
     return rc;
