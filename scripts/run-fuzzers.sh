@@ -2,7 +2,8 @@
 # Runs every fuzz harness (one per fuzz/fuzz_*.cpp, built into
 # build-fuzz/bin by `make fuzz`) for SECONDS seconds each, starting from a
 # scratch copy of its seed corpus fuzz/corpus/NAME (NAME without "fuzz_"),
-# so that the seeds in the tree stay as they are. Fails on any finding: a
+# so that the seeds in the tree stay as they are, with the extra libFuzzer
+# flags of fuzz/NAME.options when there is one. Fails on any finding: a
 # crash, a sanitizer report, a leak, a time-out or a harness that is missing.
 #
 #   scripts/run-fuzzers.sh SECONDS
@@ -37,8 +38,10 @@ for name in "${harnesses[@]}"; do
   rm -rf "$scratch" "$artifacts"
   mkdir -p "$scratch" "$artifacts"
   [ -d "$corpus" ] && cp -R "$corpus"/. "$scratch"/
+  extra=()
+  [ -f "fuzz/$name.options" ] && read -ra extra < "fuzz/$name.options"
   echo "run-fuzzers: $name for ${seconds}s from $(ls "$scratch" | wc -l) seeds"
-  if ! "$exe" -max_total_time="$seconds" -timeout=10 -rss_limit_mb=2048 \
+  if ! "$exe" -max_total_time="$seconds" -timeout=10 -rss_limit_mb=2048 "${extra[@]}" \
       -print_final_stats=1 -artifact_prefix="$artifacts" "$scratch" \
       >"$work/$name.log" 2>&1; then
     failed=1
