@@ -17,6 +17,8 @@ needs=(
   clang:/usr/bin/clang++
   libclang-rt-14-dev:/usr/lib/llvm-14/lib/clang/14.0.6/lib/linux/libclang_rt.fuzzer-x86_64.a
 )
+# A target that needs more passes it in VRX_EXTRA_DEPS, in the same form
+# (make coverage passes gcovr:/usr/bin/gcovr), so that the others go without.
 [ "${VRX_EXTRA_DEPS:-}" ] && needs+=(${VRX_EXTRA_DEPS})
 
 missing=()
