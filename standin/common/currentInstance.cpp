@@ -12,6 +12,7 @@
 
 #include "common/fixedText.h"
 #include "common/instance.h"
+#include "common/instanceReader.h"
 
 namespace standin {
 
@@ -19,10 +20,8 @@ namespace {
 
 struct Cache {
     bool loaded = false;
-    std::filesystem::path dir;
-    bool fileExists = false;
-    struct stat fileStat {};
-    std::string content;
+    std::string dir;
+    FileStamp stamp;
     // The answer before the last reload stays alive too, so that a reference
     // taken by a caller survives a reload triggered by a service it calls.
     std::unique_ptr<Instance> instance = std::make_unique<Instance>();
@@ -33,27 +32,6 @@ bool sameFile(const struct stat& a, const struct stat& b) {
     return a.st_dev == b.st_dev && a.st_ino == b.st_ino && a.st_size == b.st_size &&
            a.st_mtim.tv_sec == b.st_mtim.tv_sec && a.st_mtim.tv_nsec == b.st_mtim.tv_nsec &&
            a.st_ctim.tv_sec == b.st_ctim.tv_sec && a.st_ctim.tv_nsec == b.st_ctim.tv_nsec;
-}
-
-// File times tick in steps of a few milliseconds, so two writes of the same
-// size within one step look alike. A file changed that recently is compared
-// by content as well; any older file is settled by its stat alone.
-bool recentlyChanged(const struct stat& st) {
-    timespec now{};
-    clock_gettime(CLOCK_REALTIME, &now);
-    return now.tv_sec - st.st_ctim.tv_sec < 2;
-}
-
-std::string readAll(const std::filesystem::path& file) {
-    std::string content;
-    if (FILE* f = std::fopen(file.c_str(), "rb")) {
-        char buffer[16384];
-        size_t n;
-        while ((n = std::fread(buffer, 1, sizeof buffer, f)) > 0)
-            content.append(buffer, n);
-        std::fclose(f);
-    }
-    return content;
 }
 
 // What a signal handler may learn about the instance without reading files:
@@ -140,29 +118,31 @@ const Instance& currentInstance() {
     static std::mutex& mutex = *new std::mutex;
     std::lock_guard lock(mutex);
 
-    std::filesystem::path dir = instanceDirectory();
-    std::filesystem::path file = dir / "instance.json";
-    struct stat st {};
-    bool exists = stat(file.c_str(), &st) == 0;
-    bool unchanged = cache.loaded && cache.dir == dir && cache.fileExists == exists &&
-                     (!exists || sameFile(cache.fileStat, st));
-    if (unchanged && exists && recentlyChanged(st))
-        unchanged = readAll(file) == cache.content;
-    if (unchanged)
+    // Services ask for every pool and message; a check of the file's status
+    // is all that each call costs while the file stays as it was read.
+    char dir[PATH_MAX];
+    char file[PATH_MAX + 32];
+    FixedText path(file, sizeof file);
+    // Without an instance directory there is no file, and the defaults hold.
+    bool usable = instanceDirectoryPath(dir, sizeof dir);
+    if (usable)
+        usable = !path.add(dir).add("/instance.json").overflow();
+    if (cache.loaded && cache.dir == dir &&
+        (usable ? stillCurrent(file, cache.stamp) : !cache.stamp.exists)) {
         return *cache.instance;
+    }
 
     cache.loaded = true;
     cache.dir = dir;
-    cache.fileExists = exists;
-    cache.fileStat = st;
-    cache.content = exists ? readAll(file) : std::string();
+    cache.stamp = FileStamp{};
     auto instance = std::make_unique<Instance>();
+    InstanceSink poolsNotKept;
     std::string error;
-    if (!exists || !parseInstance(cache.content, *instance, error))
+    if (!usable || !readInstanceFile(dir, *instance, poolsNotKept, error, &cache.stamp))
         *instance = Instance{};
     cache.previous = std::move(cache.instance);
     cache.instance = std::move(instance);
-    publish(dir, exists, st, *cache.instance);
+    publish(dir, cache.stamp.exists, cache.stamp.st, *cache.instance);
     return *cache.instance;
 }
 

@@ -101,9 +101,11 @@ bool loadInstance(const std::filesystem::path& dir, Instance& out, std::string& 
 // The same for the text of an instance.json.
 bool parseInstance(const std::string& content, Instance& out, std::string& error);
 
-// The instance as the system services see it: loaded on first use and again
-// whenever the instance directory or its instance.json changes (path, size,
-// modification time), so that a process that switches VRX_INSTANCE_DIR, or
+// The instance as the system services see it: its settings, without the
+// pool lists (pools, databases, applications and private memory stay empty;
+// only the snapshot monitor reads them). Loaded on first use and again
+// whenever the instance directory or its instance.json may have changed
+// (path, size, times), so that a process that switches VRX_INSTANCE_DIR, or
 // an edited file, is followed. The defaults when the file cannot be read or
 // is not valid. The reference stays valid across one further reload, so
 // holding it while calling another service is safe. Not for signal handlers.

@@ -5,6 +5,7 @@
 
 #include "common/export.h"
 #include "common/instance.h"
+#include "common/instanceReader.h"
 #include "engine/vrxwint.h"
 
 namespace {
@@ -21,9 +22,12 @@ void put(uint8_t* block, uint32_t offset, T value) {
 // that the demo instance can be located.
 __attribute__((constructor(200))) void fillFromInstance() {
     standin::Instance instance;
+    standin::InstanceSink poolsNotNeeded;
     std::string error;
-    if (!standin::loadInstance(standin::instanceDirectory(), instance, error))
+    if (!standin::readInstanceFile(standin::instanceDirectory().c_str(), instance, poolsNotNeeded,
+                                   error, nullptr)) {
         return;
+    }
     put(gTraceFlagBlock, VRX_TRACE_WORD_OFFSET, instance.traceFlags);
     put(gKernelControlBlock, VRX_KRCB_MULTI_PARTITION, instance.krcb.multiPartition);
     put(gKernelControlBlock, VRX_KRCB_PARTITION, instance.krcb.partition);
