@@ -7,6 +7,7 @@
 #include <cstring>
 #include <string>
 
+#include "app/instanceView.h"
 #include "common/diagLog.h"
 #include "common/export.h"
 #include "common/instance.h"
@@ -58,13 +59,14 @@ extern "C" VRX_EXPORT int32_t sqleInitApplicationEnvironment(uint32_t /*reserved
     std::filesystem::path dir = standin::instanceDirectory();
     int32_t result = checkDirectory(dir);
     if (result == 0) {
-        standin::Instance instance;
-        std::string error;
-        if (!standin::loadInstance(dir, instance, error)) {
-            standin::logEngineProblem(error, kProbeInstanceFile);
+        // The read that checks the file also gives the snapshot monitor its
+        // first view of the instance.
+        auto view = standin::instanceView(dir.string());
+        if (!view->valid) {
+            standin::logEngineProblem(view->error, kProbeInstanceFile);
             result = kInitBadInstance;
-        } else if (instance.faults.initApplicationEnvironment) {
-            result = *instance.faults.initApplicationEnvironment;
+        } else if (view->settings.faults.initApplicationEnvironment) {
+            result = *view->settings.faults.initApplicationEnvironment;
         }
     }
     if (ca != nullptr && result != 0)

@@ -1,7 +1,8 @@
 // The snapshot monitor: vrxGetSnapshotSize and vrxGetSnapshot.
 //
-// Every request reads the instance afresh, so that an edited instance.json
-// shows in the next snapshot of a running client. A request is checked
+// Every take reads instance.json afresh, so that an edited file shows in
+// the next snapshot of a running client; the size estimate comes from the
+// last read while the file is certainly unchanged since. A request is checked
 // before anything is read; a refused request is a nonzero call result (see
 // snapshotCodes.h). What the monitor has to say about the instance is the
 // SQL code in the sqlca.
@@ -12,10 +13,12 @@
 #include <fstream>
 #include <iterator>
 #include <map>
+#include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
 
+#include "app/instanceView.h"
 #include "app/snapshotCodes.h"
 #include "app/streamEncoder.h"
 #include "common/diagLog.h"
@@ -86,22 +89,26 @@ int32_t checkAddressing(uint32_t streamVersion, int32_t partition, uint32_t sele
 
 // The instance as one request sees it, with the stream it would be served.
 struct Served {
-    std::filesystem::path dir;
-    Instance instance;
+    std::string dir;
+    std::shared_ptr<const InstanceView> view;
     SnapshotKind kind = SnapshotKind::Instance;
     std::optional<std::string> fileStream;  // a streamFile's bytes, as they stand
 
-    const SnapshotAnswer& shape() const { return instance.snapshots[static_cast<int>(kind)]; }
+    const Instance& settings() const { return view->settings; }
+    const SnapshotAnswer& shape() const { return settings().snapshots[static_cast<int>(kind)]; }
 };
+
+int32_t unreadable(const std::string& error) {
+    logEngineProblem("snapshot monitor: " + error);
+    return kMonInstanceUnreadable;
+}
 
 int32_t loadServed(SnapshotKind kind, Served& served) {
     served.kind = kind;
-    served.dir = instanceDirectory();
-    std::string error;
-    if (!loadInstance(served.dir, served.instance, error)) {
-        logEngineProblem("snapshot monitor: " + error);
-        return kMonInstanceUnreadable;
-    }
+    served.dir = instanceDirectory().string();
+    served.view = instanceView(served.dir);
+    if (!served.view->valid)
+        return unreadable(served.view->error);
     return 0;
 }
 
@@ -109,7 +116,7 @@ int32_t loadFileStream(Served& served) {
     const auto& file = served.shape().streamFile;
     if (!file)
         return 0;
-    std::filesystem::path path = served.dir / *file;
+    std::filesystem::path path = std::filesystem::path(served.dir) / *file;
     std::ifstream in(path, std::ios::binary);
     std::string bytes;
     if (in)
@@ -125,23 +132,23 @@ int32_t loadFileStream(Served& served) {
 
 // The SQL code with which the instance's state and content refuse a
 // snapshot of this kind, or 0.
-int32_t refusal(const Served& served, int32_t configuredCode) {
-    if (served.instance.state == State::Stopped)
+int32_t refusal(const Instance& settings, const StreamSizes& sizes, SnapshotKind kind,
+                bool fileStream, int32_t configuredCode) {
+    if (settings.state == State::Stopped)
         return SQLC_INSTANCE_STOPPED;
-    if (served.instance.state == State::Unauthorized)
+    if (settings.state == State::Unauthorized)
         return SQLC_NOT_AUTHORIZED;
     if (configuredCode != 0)
         return configuredCode;
-    if (served.fileStream)
+    if (fileStream)
         return kSqlOk;
-    const Instance& inst = served.instance;
-    switch (served.kind) {
+    switch (kind) {
         case SnapshotKind::Database:
-            if (inst.databases.empty())
+            if (sizes.databases == 0)
                 return SQLC_NOTHING_TO_REPORT;
             break;
         case SnapshotKind::Application:
-            if (inst.applications.empty() && inst.privateMemory.empty()) {
+            if (sizes.applications == 0 && sizes.privateSections == 0) {
                 return SQLC_NOTHING_TO_REPORT;
             }
             break;
@@ -151,6 +158,11 @@ int32_t refusal(const Served& served, int32_t configuredCode) {
     return kSqlOk;
 }
 
+int32_t refusal(const Served& served, int32_t configuredCode) {
+    return refusal(served.settings(), served.view->sizes, served.kind,
+                   served.fileStream.has_value(), configuredCode);
+}
+
 StreamScope scopeOf(const Served& served) {
     return StreamScope{served.kind, internalPoolsExposed(served.dir.c_str())};
 }
@@ -158,7 +170,7 @@ StreamScope scopeOf(const Served& served) {
 uint64_t streamSize(const Served& served, StreamScope scope) {
     if (served.fileStream)
         return served.fileStream->size();
-    return encodedStreamSize(served.instance, scope);
+    return served.view->sizes.of(scope);
 }
 
 // Takes that answer 1606 whatever the buffer, counted per object type for
@@ -172,11 +184,34 @@ bool forcedTooSmall(const Served& served) {
     if (limit == 0)
         return false;
     std::lock_guard lock(mutex);
-    uint32_t& count = taken[served.dir.string()][static_cast<int>(served.kind)];
+    uint32_t& count = taken[served.dir][static_cast<int>(served.kind)];
     if (count >= limit)
         return false;
     ++count;
     return true;
+}
+
+// Encodes the stream into the caller's buffer while instance.json is read
+// once more. The file was found unchanged a moment ago; should it have
+// changed since, the answer is the one the new file gives, and a stream that
+// no longer fits the buffer is answered 1606 (the part that fit is written).
+int32_t encodeInto(const Served& served, StreamScope scope, char* out, uint32_t capacity,
+                   uint64_t* size, sqlca* ca) {
+    StreamWriter writer(scope, out, capacity);
+    auto view = readInstanceView(served.dir, writer);
+    if (!view->valid)
+        return unreadable(view->error);
+    *size = writer.size();
+    const SnapshotAnswer& shape = view->settings.snapshots[static_cast<int>(served.kind)];
+    if (shape.takeRc != 0)
+        return shape.takeRc;
+    if (int32_t code =
+            refusal(view->settings, view->sizes, served.kind, false, shape.takeSqlcode)) {
+        answer(ca, code);
+    } else if (writer.size() > capacity) {
+        answer(ca, SQLC_BUFFER_TOO_SMALL);
+    }
+    return 0;
 }
 
 int32_t getSnapshotSize(uint32_t version, MonSizeRequest* request, sqlca* ca) {
@@ -253,9 +288,11 @@ int32_t getSnapshot(uint32_t version, MonSnapshotRequest* request, sqlca* ca) {
     if (served.fileStream) {
         if (size != 0)
             std::memcpy(out, served.fileStream->data(), size);
-    } else {
-        encodeStream(served.instance, scope, out);
+    } else if (int32_t rc = encodeInto(served, scope, out, request->bufferSize, &size, ca)) {
+        return rc;
     }
+    if (ca->sqlcode != kSqlOk)
+        return 0;
     if (request->output != nullptr) {
         std::memset(request->output, 0, sizeof(*request->output));
         request->output->bytesWritten = static_cast<uint32_t>(size);

@@ -1,10 +1,7 @@
 #include "app/streamEncoder.h"
 
 #include <bit>
-#include <cstdlib>
 #include <cstring>
-#include <string_view>
-#include <vector>
 
 #include "common/poolTable.h"
 
@@ -33,166 +30,210 @@ enum ElementId : uint16_t {
     kBufferPoolName = 874,
 };
 
-// The sizes below are data sizes (without the element's own header); the
-// writer asks for each nested element's size once, just before writing its
-// header, so the whole encoding stays linear in the instance.
+static_assert(std::endian::native == std::endian::little,
+              "the data stream is little-endian and written in place");
 
-bool visible(const Pool& pool, const StreamScope& scope) {
-    return scope.showInternalPools || !poolIsInternal(pool.id);
+// The sizes below are data sizes, without the element's own header.
+
+bool visible(const PoolRead& pool, bool showInternalPools) {
+    return showInternalPools || !poolIsInternal(pool.id);
 }
 
-uint64_t poolDataSize(const Pool& pool) {
-    uint64_t size = kHeader + 4;
-    for (const auto* value : {&pool.current, &pool.maximum, &pool.highWater}) {
-        if (value->has_value())
-            size += kHeader + 8;
-    }
-    if (pool.bufferPool)
-        size += kHeader + pool.bufferPool->size();
-    return size;
+uint64_t poolDataSize(const PoolRead& pool) {
+    return kHeader + 4 + (kHeader + 8) * (pool.hasCurrent + pool.hasMaximum + pool.hasHighWater) +
+           (pool.hasBufferPool ? kHeader + pool.bufferPool.size() : 0);
 }
 
-uint64_t poolsSize(const std::vector<Pool>& pools, const StreamScope& scope) {
+uint64_t poolsSize(std::span<const PoolRead> pools, bool showInternalPools) {
     uint64_t size = 0;
-    for (const Pool& pool : pools) {
-        if (visible(pool, scope))
+    for (const PoolRead& pool : pools) {
+        if (visible(pool, showInternalPools))
             size += kHeader + poolDataSize(pool);
     }
     return size;
 }
 
-uint64_t databaseDataSize(const Database& db, const StreamScope& scope) {
-    return kHeader + db.name.size() + poolsSize(db.pools, scope);
+// The section's data before its pools.
+uint64_t sectionFieldsSize(PoolList list, const SectionRead& section) {
+    switch (list) {
+        case PoolList::Databases:
+            return kHeader + section.name.size();
+        case PoolList::Applications:
+            return kHeader + 4 + kHeader + section.name.size();
+        default:
+            return kHeader + 4;
+    }
 }
 
-uint64_t applicationDataSize(const Application& app, const StreamScope& scope) {
-    return kHeader + 4 + kHeader + app.database.size() + poolsSize(app.pools, scope);
+SnapshotKind kindOf(PoolList list) {
+    switch (list) {
+        case PoolList::Instance:
+            return SnapshotKind::Instance;
+        case PoolList::Databases:
+            return SnapshotKind::Database;
+        default:
+            return SnapshotKind::Application;
+    }
 }
 
-uint64_t privateMemoryDataSize(const PrivateMemory& section, const StreamScope& scope) {
-    return kHeader + 4 + poolsSize(section.pools, scope);
+char* header(char* at, ElementType type, ElementId id, uint64_t size) {
+    auto size32 = static_cast<uint32_t>(size);
+    auto type16 = static_cast<uint16_t>(type);
+    auto id16 = static_cast<uint16_t>(id);
+    std::memcpy(at, &size32, 4);
+    std::memcpy(at + 4, &type16, 2);
+    std::memcpy(at + 6, &id16, 2);
+    return at + kHeader;
 }
 
-uint64_t snapshotDataSize(const Instance& instance, const StreamScope& scope) {
-    uint64_t size = 0;
-    switch (scope.kind) {
-        case SnapshotKind::Instance:
-            size = poolsSize(instance.pools, scope);
-            break;
-        case SnapshotKind::Database:
-            for (const Database& db : instance.databases) {
-                size += kHeader + databaseDataSize(db, scope);
-            }
-            break;
-        case SnapshotKind::Application:
-            for (const Application& app : instance.applications) {
-                size += kHeader + applicationDataSize(app, scope);
-            }
-            for (const PrivateMemory& section : instance.privateMemory) {
-                size += kHeader + privateMemoryDataSize(section, scope);
-            }
-            break;
-    }
-    return size;
+template <typename T>
+char* value(char* at, ElementType type, ElementId id, T v) {
+    at = header(at, type, id, sizeof v);
+    std::memcpy(at, &v, sizeof v);
+    return at + sizeof v;
 }
 
-// Writes little-endian fields straight into the caller's buffer.
-class Writer {
-  public:
-    explicit Writer(char* out) : at_(out) {}
+// A pool's element up to its buffer pool name, which follows separately.
+template <typename Put>
+void writePool(Put& put, const PoolRead& pool) {
+    char bytes[kHeader + (kHeader + 4) + 3 * (kHeader + 8) + kHeader];
+    char* at = header(bytes, kNested, kPool, poolDataSize(pool));
+    at = value(at, kU32, kPoolId, pool.id);
+    if (pool.hasCurrent)
+        at = value(at, kU64, kPoolCurrent, pool.current);
+    if (pool.hasMaximum)
+        at = value(at, kU64, kPoolMaximum, pool.maximum);
+    if (pool.hasHighWater)
+        at = value(at, kU64, kPoolHighWater, pool.highWater);
+    if (pool.hasBufferPool)
+        at = header(at, kText, kBufferPoolName, pool.bufferPool.size());
+    put(bytes, static_cast<uint64_t>(at - bytes));
+    if (pool.hasBufferPool)
+        put(pool.bufferPool.data(), pool.bufferPool.size());
+}
 
-    void header(ElementType type, ElementId id, uint64_t size) {
-        auto size32 = static_cast<uint32_t>(size);
-        auto type16 = static_cast<uint16_t>(type);
-        auto id16 = static_cast<uint16_t>(id);
-        put(&size32, 4);
-        put(&type16, 2);
-        put(&id16, 2);
-    }
-    void u32(ElementId id, uint32_t value) {
-        header(kU32, id, 4);
-        put(&value, 4);
-    }
-    void u64(ElementId id, int64_t value) {
-        header(kU64, id, 8);
-        put(&value, 8);
-    }
-    void text(ElementId id, std::string_view value) {
-        header(kText, id, value.size());
-        put(value.data(), value.size());
-    }
-    char* position() const { return at_; }
-
-  private:
-    void put(const void* bytes, size_t n) {
-        if (n != 0)
-            std::memcpy(at_, bytes, n);
-        at_ += n;
-    }
-    char* at_;
-};
-
-static_assert(std::endian::native == std::endian::little,
-              "the data stream is little-endian and written in place");
-
-void writePools(Writer& w, const std::vector<Pool>& pools, const StreamScope& scope) {
-    for (const Pool& pool : pools) {
-        if (!visible(pool, scope))
-            continue;
-        w.header(kNested, kPool, poolDataSize(pool));
-        w.u32(kPoolId, pool.id);
-        if (pool.current)
-            w.u64(kPoolCurrent, *pool.current);
-        if (pool.maximum)
-            w.u64(kPoolMaximum, *pool.maximum);
-        if (pool.highWater)
-            w.u64(kPoolHighWater, *pool.highWater);
-        if (pool.bufferPool)
-            w.text(kBufferPoolName, *pool.bufferPool);
+template <typename Put>
+void writePools(Put& put, std::span<const PoolRead> pools, bool showInternalPools) {
+    for (const PoolRead& pool : pools) {
+        if (visible(pool, showInternalPools))
+            writePool(put, pool);
     }
 }
 
 }  // namespace
 
-uint64_t encodedStreamSize(const Instance& instance, StreamScope scope) {
-    return kHeader + snapshotDataSize(instance, scope);
+void StreamSizer::restart() {
+    sizes_ = StreamSizes{};
+    for (auto& kind : sizes_.bytes) {
+        kind[0] = kHeader;
+        kind[1] = kHeader;
+    }
 }
 
-uint64_t encodeStream(const Instance& instance, StreamScope scope, char* out) {
-    uint64_t size = encodedStreamSize(instance, scope);
-    Writer w(out);
-    w.header(kNested, kSnapshot, size - kHeader);
-    switch (scope.kind) {
-        case SnapshotKind::Instance:
-            writePools(w, instance.pools, scope);
+void StreamSizer::instancePools(std::span<const PoolRead> pools) {
+    auto& bytes = sizes_.bytes[static_cast<int>(SnapshotKind::Instance)];
+    bytes[0] += poolsSize(pools, false);
+    bytes[1] += poolsSize(pools, true);
+}
+
+void StreamSizer::section(PoolList list, const SectionRead& section) {
+    auto& bytes = sizes_.bytes[static_cast<int>(kindOf(list))];
+    uint64_t fields = kHeader + sectionFieldsSize(list, section);
+    bytes[0] += fields + poolsSize(section.pools, false);
+    bytes[1] += fields + poolsSize(section.pools, true);
+    switch (list) {
+        case PoolList::Databases:
+            ++sizes_.databases;
             break;
-        case SnapshotKind::Database:
-            for (const Database& db : instance.databases) {
-                w.header(kNested, kDatabase, databaseDataSize(db, scope));
-                w.text(kDatabaseName, db.name);
-                writePools(w, db.pools, scope);
-            }
+        case PoolList::Applications:
+            ++sizes_.applications;
             break;
-        case SnapshotKind::Application:
-            for (const Application& app : instance.applications) {
-                w.header(kNested, kApplication, applicationDataSize(app, scope));
-                w.u32(kApplicationNumber, app.number);
-                w.text(kDatabaseName, app.database);
-                writePools(w, app.pools, scope);
-            }
-            for (const PrivateMemory& section : instance.privateMemory) {
-                w.header(kNested, kPrivateMemory, privateMemoryDataSize(section, scope));
-                w.u32(kPrivateMemoryNumber, section.number);
-                writePools(w, section.pools, scope);
-            }
+        default:
+            ++sizes_.privateSections;
             break;
     }
-    // The two descriptions of the layout above must agree; a stream whose
-    // headers disagree with its bytes would be worse than no engine.
-    auto written = static_cast<uint64_t>(w.position() - out);
-    if (written != size)
-        std::abort();
-    return written;
+}
+
+void StreamWriter::restart() {
+    StreamSizer::restart();
+    // The enclosing element's header is written last, when its size is known.
+    at_ = kHeader;
+    heldBack_.clear();
+    applicationsDone_ = false;
+}
+
+void StreamWriter::put(const void* bytes, uint64_t n) {
+    if (at_ <= capacity_ && n <= capacity_ - at_ && n != 0)
+        std::memcpy(out_ + at_, bytes, n);
+    at_ += n;
+}
+
+template <typename Put>
+void StreamWriter::writeSection(Put& put, PoolList list, const SectionRead& section) const {
+    bool all = scope_.showInternalPools;
+    uint64_t size = sectionFieldsSize(list, section) + poolsSize(section.pools, all);
+    char bytes[3 * kHeader + 4];
+    char* at = bytes;
+    switch (list) {
+        case PoolList::Databases:
+            at = header(at, kNested, kDatabase, size);
+            at = header(at, kText, kDatabaseName, section.name.size());
+            put(bytes, static_cast<uint64_t>(at - bytes));
+            put(section.name.data(), section.name.size());
+            break;
+        case PoolList::Applications:
+            at = header(at, kNested, kApplication, size);
+            at = value(at, kU32, kApplicationNumber, section.number);
+            at = header(at, kText, kDatabaseName, section.name.size());
+            put(bytes, static_cast<uint64_t>(at - bytes));
+            put(section.name.data(), section.name.size());
+            break;
+        default:
+            at = header(at, kNested, kPrivateMemory, size);
+            at = value(at, kU32, kPrivateMemoryNumber, section.number);
+            put(bytes, static_cast<uint64_t>(at - bytes));
+            break;
+    }
+    writePools(put, section.pools, all);
+}
+
+void StreamWriter::instancePools(std::span<const PoolRead> pools) {
+    StreamSizer::instancePools(pools);
+    if (scope_.kind != SnapshotKind::Instance)
+        return;
+    auto direct = [this](const void* bytes, uint64_t n) { put(bytes, n); };
+    writePools(direct, pools, scope_.showInternalPools);
+}
+
+void StreamWriter::section(PoolList list, const SectionRead& section) {
+    StreamSizer::section(list, section);
+    if (kindOf(list) != scope_.kind)
+        return;
+    if (list == PoolList::PrivateMemory && !applicationsDone_) {
+        auto holdBack = [this](const void* bytes, uint64_t n) {
+            heldBack_.append(static_cast<const char*>(bytes), n);
+        };
+        writeSection(holdBack, list, section);
+        return;
+    }
+    auto direct = [this](const void* bytes, uint64_t n) { put(bytes, n); };
+    writeSection(direct, list, section);
+}
+
+void StreamWriter::endList(PoolList list) {
+    if (list != PoolList::Applications)
+        return;
+    applicationsDone_ = true;
+    put(heldBack_.data(), heldBack_.size());
+    heldBack_.clear();
+}
+
+void StreamWriter::endDocument() {
+    put(heldBack_.data(), heldBack_.size());
+    heldBack_.clear();
+    if (capacity_ >= kHeader) {
+        header(out_, kNested, kSnapshot, at_ - kHeader);
+    }
 }
 
 }  // namespace standin
