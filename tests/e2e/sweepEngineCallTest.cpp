@@ -44,7 +44,8 @@ struct Answer {
     // instance.json keys for a failing kind; the %s stands for its name.
     std::string keys;
     Outcome outcome;
-    bool everyKind = false;  // the answer applies to every object type at once
+    bool everyKind = false;   // the answer applies to every object type at once
+    std::string faults = {};  // the engine's faults besides
 };
 
 const char* const kEstimateText = "Error in call to vrxGetSnapshotSize.\nrc=";
@@ -69,6 +70,13 @@ std::vector<Answer> answers() {
         {"seven takes too small", R"("tooSmall": 7)", {Outcome::Clean}},
         {"eight takes too small", R"("tooSmall": 8)", kNoRoomAfterRetries},
         {"estimate of 0 bytes", R"("estimate": 0)", kNoRoomAfterRetries},
+        // The first block is released before the doubled one is refused;
+        // the other streams are far smaller than the largest block.
+        {"doubled block refused",
+         R"("estimate": 4000, "tooSmall": 1)",
+         {Outcome::Refused},
+         false,
+         R"("maxAllocBytes": 5000)"},
     };
     const struct {
         const char* call;
@@ -260,7 +268,9 @@ TEST(EngineCallSweepTest, SnapshotAnswersPerObjectTypeAndReport) {
             const std::vector<Kind> failing =
                 a.everyKind ? std::vector<Kind>{kInstance, kDatabase, kApplication}
                             : std::vector<Kind>{taker.kind};
-            const std::string keys = a.everyKind ? a.keys : formatKeys(a.keys, taker.kind);
+            std::string keys = a.everyKind ? a.keys : formatKeys(a.keys, taker.kind);
+            if (!a.faults.empty())
+                keys += R"(, "faults": {)" + a.faults + "}";
             expectRun(instance, keys, taker.flags, expect(taker.flags, failing, a.outcome));
             ++runs;
         }
