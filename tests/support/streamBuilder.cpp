@@ -71,13 +71,10 @@ std::string StreamBuilder::str() const {
     return bytes_;
 }
 
-std::string wrapStream(const std::string& body) {
-    StreamBuilder b;
-    b.open(1);
-    std::string s = b.close().str();
-    auto size = static_cast<uint32_t>(body.size());
-    std::memcpy(s.data(), &size, 4);
-    return s + body;
+std::string wrapElement(uint16_t element, const std::string& body) {
+    return StreamBuilder().raw(1, element, static_cast<uint32_t>(body.size()), body).str();
 }
+
+std::string wrapStream(const std::string& body) { return wrapElement(1, body); }
 
 }  // namespace mtrktest

@@ -34,6 +34,10 @@ private:
     std::vector<size_t> open_;
 };
 
+// A type 1 element around `body` (a section around its values and pools,
+// say).
+std::string wrapElement(uint16_t element, const std::string& body);
+
 // A whole snapshot: element 1 of type 1 around `body`.
 std::string wrapStream(const std::string& body);
 
