@@ -1,5 +1,6 @@
 // sqlaintp_api: the SQL catalog's text for an sqlca, with its tokens put in
 // and broken into lines.
+#include <algorithm>
 #include <cstring>
 #include <optional>
 #include <sstream>
@@ -87,6 +88,11 @@ TEST_F(SqlaintpTest, LinesBreakAtSpacesWithinTheWidth) {
 
 TEST_F(SqlaintpTest, TokensAreTheInserts) {
     instanceCatalog("probesql.mo", {{"-5", "[%1] [%2]"}, {"-6", "value %1"}});
+    // Tokens end in 0xFF; "|" stands for it here.
+    auto tokens = [](std::string text) {
+        std::replace(text.begin(), text.end(), '|', '\xFF');
+        return text;
+    };
     struct Case {
         const char* name;
         std::string tokens;
@@ -95,30 +101,15 @@ TEST_F(SqlaintpTest, TokensAreTheInserts) {
     };
     const std::string seventy(70, 'x');
     const Case cases[] = {
-        {"one token", "5\xFF", {}, "[5] []"},
-        {"two tokens",
-         "ab\xFF"
-         "cd\xFF",
-         {},
-         "[ab] [cd]"},
-        {"last token without its 0xFF",
-         "ab\xFF"
-         "cd",
-         {},
-         "[ab] [cd]"},
+        {"one token", tokens("5|"), {}, "[5] []"},
+        {"two tokens", tokens("ab|cd|"), {}, "[ab] [cd]"},
+        {"last token without its end", tokens("ab|cd"), {}, "[ab] [cd]"},
         {"no tokens", "", {}, "[] []"},
-        {"length ends the tokens",
-         "ab\xFF"
-         "cd\xFF",
-         3, "[ab] []"},
-        {"negative length", "ab\xFF", -5, "[] []"},
+        {"length ends the tokens", tokens("ab|cd|"), 3, "[ab] []"},
+        {"negative length", tokens("ab|"), -5, "[] []"},
         {"length beyond the field", seventy, 200, "[" + seventy + "] []"},
-        {"empty tokens", "\xFF\xFFz\xFF", {}, "[] []"},
-        {"a token is never a placeholder",
-         "%2\xFF"
-         "second\xFF",
-         {},
-         "[%2] [second]"},
+        {"empty tokens", tokens("||z|"), {}, "[] []"},
+        {"a token is never a placeholder", tokens("%2|second|"), {}, "[%2] [second]"},
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.name);
@@ -126,7 +117,7 @@ TEST_F(SqlaintpTest, TokensAreTheInserts) {
         EXPECT_EQ(render(-5, c.tokens, 0, 2048, length, "probesql.mo").text, c.expected);
     }
     // A token with spaces is broken like the rest of the text.
-    EXPECT_EQ(render(-6, "a b c\xFF", 3, 2048, {}, "probesql.mo").text, "value\na b\nc");
+    EXPECT_EQ(render(-6, tokens("a b c|"), 3, 2048, {}, "probesql.mo").text, "value\na b\nc");
 }
 
 TEST_F(SqlaintpTest, InstanceCatalogComesFirst) {
@@ -187,7 +178,7 @@ TEST_F(SqlaintpTest, FailuresAnswerNegative) {
     EXPECT_LT(sqlaintp_api(buffer, sizeof buffer, 70, "vrxsql.mo", nullptr), 0);
     EXPECT_LT(sqlaintp_api(nullptr, 64, 70, "vrxsql.mo", nullptr), 0);
 
-    useInstanceJson(R"({"faults": {"sqlaintp": -7}})");
+    instance_->writeJson(R"({"faults": {"sqlaintp": -7}})");
     auto faulted = render(-6103, "5\xFF");
     EXPECT_EQ(faulted.rc, -7);
 }
