@@ -61,18 +61,6 @@ void patchWord(std::string& mo, size_t offset, uint32_t value) {
     putWord(mo, offset, value, bigEndian);
 }
 
-bool compilePo(const std::string& po, const fs::path& mo, const std::string& options) {
-    fs::path source = mo;
-    source.replace_extension(".po");
-    fs::create_directories(mo.parent_path());
-    std::ofstream(source, std::ios::binary) << po;
-    std::string command =
-        "msgfmt " + options + " -o '" + mo.string() + "' '" + source.string() + "' 2>/dev/null";
-    bool ok = std::system(command.c_str()) == 0;
-    fs::remove(source);
-    return ok;
-}
-
 void MessageTest::SetUp() {
     for (const char* name : kLocaleVariables) {
         const char* value = std::getenv(name);
@@ -117,10 +105,6 @@ std::string MessageTest::installCatalog(const std::string& locale, const std::st
 
 void MessageTest::instanceCatalog(const std::string& catalog, const CatalogEntries& entries) {
     instance_->writeFile("msg/" + catalog, buildMo(entries));
-}
-
-void MessageTest::useInstanceJson(const std::string& json) {
-    instance_->writeJson(json);
 }
 
 MessageTest::Fetched MessageTest::fetch(const std::string& catalog, uint32_t number,

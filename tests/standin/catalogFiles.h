@@ -22,11 +22,6 @@ using CatalogEntries = std::vector<std::pair<std::string, std::string>>;
 // table, strings each followed by a NUL.
 std::string buildMo(const CatalogEntries& entries, bool bigEndian = false);
 
-// Compiles a .po source with msgfmt into `mo` (extra msgfmt options may be
-// given). Returns false when msgfmt failed.
-bool compilePo(const std::string& po, const std::filesystem::path& mo,
-               const std::string& options = "");
-
 // Puts a word of a .mo image at `offset` in the image's byte order.
 void patchWord(std::string& mo, size_t offset, uint32_t value);
 
@@ -50,8 +45,6 @@ class MessageTest : public ::testing::Test {
     void removeInstalledCatalogs();
     // Writes the instance's own msg/<catalog>.
     void instanceCatalog(const std::string& catalog, const CatalogEntries& entries);
-    // Replaces the active instance by one with the given instance.json.
-    void useInstanceJson(const std::string& json);
 
     // sqlogmsg with up to two inserts in tables of exactly that many entries
     // (one null entry for none), the way the program calls it. The text on
