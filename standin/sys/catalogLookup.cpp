@@ -1,7 +1,10 @@
 #include "catalogLookup.h"
 
+#include <limits.h>
+
 #include <cstdlib>
 
+#include "common/fixedText.h"
 #include "common/instance.h"
 #include "moCatalog.h"
 
@@ -20,7 +23,8 @@ bool isPlainFileName(std::string_view name) {
 
 std::vector<std::string> localeCandidates(std::string_view locale) {
     std::vector<std::string> candidates;
-    if (locale == "C" || locale == "POSIX" || !isPlainFileName(locale))
+    std::string_view language = locale.substr(0, locale.find_first_of("_.@"));
+    if (language == "C" || language == "POSIX" || !isPlainFileName(locale))
         return candidates;
     auto add = [&](std::string_view name) {
         if (!name.empty() && (candidates.empty() || candidates.back() != name)) {
@@ -55,32 +59,42 @@ std::string messageLocale() {
     return {};
 }
 
-std::vector<std::filesystem::path> catalogSearchPath(std::string_view catalogName) {
-    std::vector<std::filesystem::path> path;
+std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid) {
     if (!isPlainFileName(catalogName))
-        return path;
-    path.push_back(instanceDirectory() / "msg" / catalogName);
-    const std::filesystem::path locales = dataDirectory() / "locale";
+        return std::nullopt;
+    // Worked out once: the data directory cannot move while the library is
+    // loaded.
+    static const std::string locales = (dataDirectory() / "locale").string();
+    char path[PATH_MAX];
+    // Message by message: a partial translation, or an instance catalog that
+    // replaces only some texts, falls back to the next catalog for the rest.
+    auto textIn = [&](std::string_view dir, std::string_view subdir) -> std::optional<std::string> {
+        FixedText file(path, sizeof path);
+        file.add(dir.data(), dir.size()).addChar('/').add(subdir.data(), subdir.size());
+        file.addChar('/').add(catalogName.data(), catalogName.size());
+        if (file.overflow())
+            return std::nullopt;
+        auto catalog = loadCatalog(path);
+        if (!catalog)
+            return std::nullopt;
+        if (auto text = catalog->find(msgid))
+            return std::string(*text);
+        return std::nullopt;
+    };
+
+    char instance[PATH_MAX];
+    if (instanceDirectoryPath(instance, sizeof instance)) {
+        if (auto text = textIn(instance, "msg"))
+            return text;
+    }
     bool englishListed = false;
     for (const auto& candidate : localeCandidates(messageLocale())) {
-        path.push_back(locales / candidate / catalogName);
+        if (auto text = textIn(locales, candidate))
+            return text;
         englishListed = englishListed || candidate == kEnglish;
     }
     if (!englishListed)
-        path.push_back(locales / kEnglish / catalogName);
-    return path;
-}
-
-std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid) {
-    // Message by message: a partial translation, or an instance catalog that
-    // replaces only some texts, falls back to the next catalog for the rest.
-    for (const auto& file : catalogSearchPath(catalogName)) {
-        auto catalog = loadCatalog(file);
-        if (!catalog)
-            continue;
-        if (auto text = catalog->find(msgid))
-            return std::string(*text);
-    }
+        return textIn(locales, kEnglish);
     return std::nullopt;
 }
 

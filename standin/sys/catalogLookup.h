@@ -2,7 +2,6 @@
 // first, then the installed ones for the user's locale, then English.
 #pragma once
 
-#include <filesystem>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -12,8 +11,9 @@ namespace standin {
 
 // The locale directories to try for a locale name as LC_ALL, LC_MESSAGES or
 // LANG give it, most specific first: "de_DE.UTF-8@euro" gives
-// "de_DE.UTF-8@euro", "de_DE.UTF-8", "de_DE", "de". The C and POSIX locales,
-// and names that could leave the locale directory, give none.
+// "de_DE.UTF-8@euro", "de_DE.UTF-8", "de_DE", "de". The C and POSIX locales
+// (with or without a codeset, as in "C.UTF-8"), and names that could leave
+// the locale directory, give none.
 std::vector<std::string> localeCandidates(std::string_view locale);
 
 // The user's message locale: the first of LC_ALL, LC_MESSAGES and LANG that
@@ -21,14 +21,10 @@ std::vector<std::string> localeCandidates(std::string_view locale);
 // call, never through the C library's locale state.
 std::string messageLocale();
 
-// The catalog files that a lookup of `catalogName` tries, in order:
+// The text of `msgid` from the first catalog that holds it, trying in order
 // <instance>/msg/<name>, <data>/locale/<candidate>/<name> for each locale
-// candidate, <data>/locale/en/<name>. Empty for a name that is not a plain
-// file name.
-std::vector<std::filesystem::path> catalogSearchPath(std::string_view catalogName);
-
-// The text of `msgid` from the first catalog on the search path that holds
-// it. A missing or damaged catalog is passed over.
+// candidate and <data>/locale/en/<name>. A missing or damaged catalog is
+// passed over; a name that is not a plain file name finds nothing.
 std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid);
 
 }  // namespace standin

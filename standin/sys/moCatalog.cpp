@@ -107,17 +107,16 @@ struct CacheEntry {
     std::shared_ptr<const MoCatalog> catalog;  // null: the file is damaged
 };
 
-std::optional<FileStamp> stampOf(const std::filesystem::path& path) {
+std::optional<FileStamp> stampOf(const char* path) {
     struct stat st {};
-    if (stat(path.c_str(), &st) != 0 || !S_ISREG(st.st_mode))
+    if (stat(path, &st) != 0 || !S_ISREG(st.st_mode))
         return std::nullopt;
     return FileStamp{static_cast<uint64_t>(st.st_size), static_cast<uint64_t>(st.st_ino),
                      static_cast<int64_t>(st.st_mtim.tv_sec),
                      static_cast<int64_t>(st.st_mtim.tv_nsec)};
 }
 
-std::shared_ptr<const MoCatalog> readCatalogFile(const std::filesystem::path& path,
-                                                 const FileStamp& stamp) {
+std::shared_ptr<const MoCatalog> readCatalogFile(const char* path, const FileStamp& stamp) {
     if (stamp.size > kMaxCatalogBytes)
         return nullptr;
     std::ifstream in(path, std::ios::binary);
@@ -135,21 +134,23 @@ std::shared_ptr<const MoCatalog> readCatalogFile(const std::filesystem::path& pa
 
 }  // namespace
 
-std::shared_ptr<const MoCatalog> loadCatalog(const std::filesystem::path& path) {
+std::shared_ptr<const MoCatalog> loadCatalog(const char* path) {
     static std::mutex mutex;
-    static std::map<std::string, CacheEntry> cache;
+    // Looked up by the caller's text, without making a key of it each time.
+    static std::map<std::string, CacheEntry, std::less<>> cache;
 
     auto stamp = stampOf(path);
     std::lock_guard lock(mutex);
+    auto it = cache.find(std::string_view(path));
     if (!stamp) {
-        cache.erase(path.string());
+        if (it != cache.end())
+            cache.erase(it);
         return nullptr;
     }
-    auto it = cache.find(path.string());
     if (it != cache.end() && it->second.stamp == *stamp)
         return it->second.catalog;
     CacheEntry entry{*stamp, readCatalogFile(path, *stamp)};
-    cache.insert_or_assign(path.string(), entry);
+    cache.insert_or_assign(std::string(path), entry);
     return entry.catalog;
 }
 

@@ -2,7 +2,6 @@
 // strings and a table of translations, each entry a length and an offset.
 #pragma once
 
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <string>
@@ -35,6 +34,6 @@ class MoCatalog {
 // system's clock goes unnoticed; replacing the file by rename never does).
 // Null when the file does not exist, cannot be read or is damaged.
 // Thread-safe.
-std::shared_ptr<const MoCatalog> loadCatalog(const std::filesystem::path& path);
+std::shared_ptr<const MoCatalog> loadCatalog(const char* path);
 
 }  // namespace standin
