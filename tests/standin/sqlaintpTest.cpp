@@ -120,11 +120,6 @@ TEST_F(SqlaintpTest, TokensAreTheInserts) {
     EXPECT_EQ(render(-6, tokens("a b c|"), 3, 2048, {}, "probesql.mo").text, "value\na b\nc");
 }
 
-TEST_F(SqlaintpTest, InstanceCatalogComesFirst) {
-    instanceCatalog("vrxsql.mo", {{"-6103", "own text [%1]"}});
-    EXPECT_EQ(render(-6103, "5\xFF").text, "own text [5]");
-}
-
 TEST_F(SqlaintpTest, EngineCatalogExplainsTheMonitorsCodes) {
     struct Case {
         int32_t code;
