@@ -74,10 +74,6 @@ TEST_F(OptionsTest, ValidCommandLinesSetTheirFields) {
         std::string expected;
     };
     const std::vector<Case> cases = {
-        {{"-i"}, "instance count=1 interval=0"},
-        {{"-d"}, "database count=1 interval=0"},
-        {{"-a"}, "application count=1 interval=0"},
-        {{"-p"}, "privateMemory count=1 interval=0"},
         {{"-h", "-h"}, "help count=1 interval=0"},
         {{"-i", "-d", "-a", "-p", "-v", "-all", "-w"},
          "instance database highWater privateMemory application verbose allPools count=1 "
