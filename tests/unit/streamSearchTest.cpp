@@ -129,34 +129,59 @@ TEST(StreamSearch, SearchesDepthFirstInStreamOrderAndSurvivesDamage) {
     }
 }
 
-// Iterates sections the way the reports do and collects each one's u32 302.
-std::vector<uint32_t> sectionNumbers(const Block& b, uint16_t id) {
-    std::vector<uint32_t> numbers;
+// Walks a region the way the reports do: sections (`section` given) from
+// each one's data on, pools from each one's header on. Collects each
+// section's u32 302 or each pool's identifier.
+std::vector<uint32_t> walk(const std::string& region, uint16_t section) {
+    const Block b(region);
+    std::vector<uint32_t> found;
     const char* start = b.at();
-    uint32_t length = mtrkStreamLength(b.at(), b.size);
+    uint32_t length = b.size;
     const char* header;
     const char* data;
     uint32_t remaining = 0;
-    while (numbers.size() < 10 &&
-           mtrkFindNextElement(start, length, &header, &data, &remaining, id) == 0) {
-        EXPECT_EQ(remaining, static_cast<uint32_t>(b.at(b.size) - data));
-        uint32_t number = 0;
-        EXPECT_EQ(mtrkGetU32(302, data, mtrkReadHeader(header).size, &number), 0);
-        numbers.push_back(number);
-        start = data;
+    uint32_t size = 0;
+    while (found.size() < 10) {
+        if ((section != 0
+                 ? mtrkFindNextElement(start, length, &header, &data, &remaining, section)
+                 : mtrkFindNextPool(start, length, &header, &data, &remaining, &size)) != 0)
+            break;
+        start = section != 0 ? data : header;
+        EXPECT_EQ(remaining, static_cast<uint32_t>(b.at(b.size) - start));
+        EXPECT_EQ(size, section != 0 ? 0 : mtrkReadHeader(header).size);
+        uint32_t value = 0;
+        EXPECT_EQ(mtrkGetU32(section != 0 ? 302 : 686, data, mtrkReadHeader(header).size, &value),
+                  0);
+        found.push_back(value);
         length = remaining;
     }
-    return numbers;
+    return found;
 }
 
-TEST(StreamFindNext, IteratesSectionsInStreamOrder) {
+TEST(StreamFindNext, IteratesSectionsAndPoolsInStreamOrder) {
     StreamBuilder body;
     for (uint32_t n : {11u, 22u, 33u})
         body.open(13).u32(302, n).pool(1, 100).close();
     body.open(10).u32(549, 0).close();
-    Block b(wrapStream(body.str()));
-    EXPECT_EQ(sectionNumbers(b, 13), (std::vector<uint32_t>{11, 22, 33}));
-    EXPECT_TRUE(sectionNumbers(b, 5).empty());
+    const std::string sections = wrapStream(body.str());
+    const std::string pools = StreamBuilder().pool(1, 10).pool(2, 20, 21).pool(3, 30).str();
+    struct Case {
+        const char* name;
+        std::string region;
+        uint16_t section;  // 0: pools
+        std::vector<uint32_t> found;
+    };
+    const Case cases[] = {
+        {"sections", sections, 13, {11, 22, 33}},
+        {"sections of another kind", sections, 5, {}},
+        {"pools of a section's data", StreamBuilder().text(321, "DB").str() + pools, 0, {1, 2, 3}},
+        {"a region that begins with a pool", pools, 0, {2, 3}},
+        {"pools of a whole stream", wrapStream(pools), 0, {1, 2, 3}},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.name);
+        EXPECT_EQ(walk(c.region, c.section), c.found);
+    }
 }
 
 TEST(StreamFindNext, StepsOverAStartThatBearsTheIdentifier) {
@@ -186,42 +211,6 @@ TEST(StreamFindNext, ADamagedOrEmptyRegionReadsNothing) {
         Block b(StreamBuilder().raw(2, 874, claimed, "12345678").u32(302, 1).str());
         EXPECT_EQ(mtrkFindNextElement(b.at(), b.size, &h, &d, &remaining, 874), 1) << claimed;
         EXPECT_EQ(mtrkFindNextPool(b.at(), b.size, &h, &d, &remaining, &size), 1) << claimed;
-    }
-}
-
-TEST(StreamFindNext, IteratesPoolsAndStepsOverALeadingPool) {
-    std::string pools = StreamBuilder().pool(1, 10).pool(2, 20, 21).pool(3, 30).str();
-    struct Case {
-        const char* name;
-        std::string region;
-        std::vector<uint32_t> ids;
-    };
-    const Case cases[] = {
-        {"a section's data", StreamBuilder().text(321, "DB").str() + pools, {1, 2, 3}},
-        {"a region that begins with a pool", pools, {2, 3}},
-        {"a whole stream", wrapStream(pools), {1, 2, 3}},
-    };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.name);
-        Block b(c.region);
-        std::vector<uint32_t> ids;
-        const char* start = b.at();
-        uint32_t length = b.size;
-        const char* header;
-        const char* data;
-        uint32_t remaining = 0;
-        uint32_t size = 0;
-        while (ids.size() < 10 &&
-               mtrkFindNextPool(start, length, &header, &data, &remaining, &size) == 0) {
-            EXPECT_EQ(remaining, static_cast<uint32_t>(b.at(b.size) - header));
-            EXPECT_EQ(size, mtrkReadHeader(header).size);
-            uint32_t id = 0;
-            EXPECT_EQ(mtrkGetPoolId(data, size, &id), 0);
-            ids.push_back(id);
-            start = header;
-            length = remaining;
-        }
-        EXPECT_EQ(ids, c.ids);
     }
 }
 
