@@ -52,8 +52,6 @@ std::vector<Slice> slices() {
 
 class AllocationSweepTest : public testing::TestWithParam<Slice> {
   protected:
-    void SetUp() override { instance_.writeFile("registry", kRegistry); }
-
     std::vector<std::string> args(const std::vector<std::string>& reports) const {
         std::vector<std::string> all{"-all"};
         all.insert(all.end(), reports.begin(), reports.end());
@@ -66,6 +64,7 @@ class AllocationSweepTest : public testing::TestWithParam<Slice> {
     RunResult run(const std::string& json, const std::vector<std::string>& reports) {
         instance_.writeJson(json);
         instance_.writeFile("diag.log", "");
+        instance_.writeFile("registry", kRegistry);
         RunOptions options;
         options.timeoutSeconds = kRunSeconds;
         return runProgram(instance_, args(reports), options);
