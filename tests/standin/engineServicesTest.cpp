@@ -92,10 +92,6 @@ TEST_F(EngineServicesTest, PoolTable) {
     EXPECT_FALSE(standin::poolIsInternal(53));
     EXPECT_EQ(standin::poolIdByName("private"), 45u);
     EXPECT_FALSE(standin::poolIdByName("Private"));
-
-    EXPECT_EQ(sqloGetMaxMemPoolID(), 52u);
-    instance_.writeJson(R"({"maxPoolId": 18})");
-    EXPECT_EQ(sqloGetMaxMemPoolID(), 18u);
 }
 
 }  // namespace

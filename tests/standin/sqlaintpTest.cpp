@@ -172,10 +172,6 @@ TEST_F(SqlaintpTest, FailuresAnswerNegative) {
     char buffer[64] = "garbage";
     EXPECT_LT(sqlaintp_api(buffer, sizeof buffer, 70, "vrxsql.mo", nullptr), 0);
     EXPECT_LT(sqlaintp_api(nullptr, 64, 70, "vrxsql.mo", nullptr), 0);
-
-    instance_->writeJson(R"({"faults": {"sqlaintp": -7}})");
-    auto faulted = render(-6103, "5\xFF");
-    EXPECT_EQ(faulted.rc, -7);
 }
 
 }  // namespace

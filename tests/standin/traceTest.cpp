@@ -49,15 +49,6 @@ T at(const uint8_t* block, uint32_t offset) {
     return value;
 }
 
-TEST(DataObjectsTest, FilledFromInstanceJsonBeforeMain) {
-    mtrktest::TempInstance instance(false);
-    instance.writeJson(R"({"traceFlags": "0x83",
-                           "krcb": {"multiPartition": 7, "partition": -1, "defaultPartition": 12}})");
-    EXPECT_TRUE(mtrktest::childTestPassed(
-        "DataObjectsChild.Match",
-        {{"VRX_INSTANCE_DIR", instance.dir().string()}, {"EXPECT_WORDS", "131 7 -1 12"}}));
-}
-
 TEST(DataObjectsTest, ZeroWhenTheInstanceCannotBeRead) {
     mtrktest::TempInstance instance(false);
     instance.writeJson(R"({"traceFlags": 1, "krcb": {"partition": 5}, "typo": 1})");
