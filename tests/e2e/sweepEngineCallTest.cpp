@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "streamBuilder.h"
 #include "sweepSupport.h"
 #include "testInstance.h"
 
@@ -383,6 +384,88 @@ TEST(EngineCallSweepTest, InsertTablesAboveTheLargestBlock) {
     EXPECT_EQ(r.out, finalReport(code));
     EXPECT_EQ(r.exitStatus, kExitRecorded);
     EXPECT_FALSE(hasMemoryProblem(instance.diagLog()));
+}
+
+// A stream served as it stands is an answer too. A section without the
+// element that names it ends the run with 1 after what came before; a pool
+// without its identifier is an inconsistent stream, recorded with 1; and a
+// damaged database stream costs the application report only the databases'
+// pools.
+TEST(EngineCallSweepTest, DamagedStreamsPerReport) {
+    using B = StreamBuilder;
+    const std::string inconsistent =
+        failureRecord(0x18780029, 50, "Inconsistent Monitor output.\nrc=", 1);
+    const std::string privateMemory = kReports[3].out;
+    // A later section of the same database with a sound pool 20, which the
+    // print must not reach once a pool of the first one failed.
+    const std::string kGoodSample = B().open(13).text(321, "SAMPLE").pool(20, 8192).close().str();
+    const struct {
+        const char* name;
+        Kind kind;
+        std::string body;
+        std::vector<std::string> args;
+        std::string out;
+        int exitStatus;
+        std::vector<std::string> records;
+    } cases[] = {
+        {"instance pool without identifier",
+         kInstance,
+         B().open(40).u64(687, 1024).close().str(),
+         {"-i", "-d"},
+         "instance\n\n" + finalReport(1),
+         kExitRecorded,
+         {inconsistent}},
+        {"database without name",
+         kDatabase,
+         B().open(13).pool(5, 4096).close().str(),
+         {"-d", "-p"},
+         "",
+         1,
+         {}},
+        {"first application without database",
+         kApplication,
+         B().open(5).u32(302, 7).close().str(),
+         {"-a"},
+         "",
+         1,
+         {}},
+        {"application without number",
+         kApplication,
+         B().open(5).text(321, "SAMPLE").close().str(),
+         {"-a"},
+         "appdb [SAMPLE]\n\n   appshrh     \n   8.0K        \n\n",
+         1,
+         {}},
+        {"private memory without number",
+         kApplication,
+         B().open(10).pool(15, 1024).close().str(),
+         {"-p"},
+         "",
+         1,
+         {}},
+        {"database pool without identifier",
+         kDatabase,
+         B().open(13).text(321, "SAMPLE").open(40).u64(687, 8192).close().close().str() +
+             kGoodSample,
+         {"-a", "-p"},
+         kApplicationsAlone + privateMemory,
+         0,
+         {}},
+        {"empty database pool",
+         kDatabase,
+         B().open(13).text(321, "SAMPLE").raw(1, 40, 0).pool(20, 8192).close().str() + kGoodSample,
+         {"-a", "-p"},
+         kApplicationsAlone + privateMemory,
+         0,
+         {}},
+    };
+    TempInstance instance;
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.name);
+        instance.writeFile("stream", wrapStream(c.body));
+        expectRun(instance, formatKeys(R"("streamFile": "stream")", c.kind), c.args,
+                  {kSweepStamp + c.out, c.exitStatus, c.records});
+    }
 }
 
 }  // namespace
