@@ -110,6 +110,16 @@ std::vector<MessageCase> messageCases() {
          {R::Fetch, R::Fetch},
          kSweepStamp + "appdb [SAMPLE]\n\ncur [Applications Shared Heap] [8192]\n"
                        "app [7]\n\ncur [Application Heap] [1024]\n"},
+        // Nor when its database snapshot is refused and the explanation
+        // cannot be fetched: the run goes on without the databases' pools.
+        {45,
+         small + R"(, "snapshots": {"database": {"sizeSqlcode": -1032}})",
+         {"-a"},
+         "",
+         0,
+         {R::Fetch, R::Estimate},
+         kSweepStamp + "appdb [SAMPLE]\n\napp [7]\n\n   apph        \n   1.0K        \n\n",
+         -1032},
     };
 }
 
