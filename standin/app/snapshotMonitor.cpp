@@ -119,8 +119,21 @@ int32_t loadFileStream(Served& served) {
     std::filesystem::path path = std::filesystem::path(served.dir) / *file;
     std::ifstream in(path, std::ios::binary);
     std::string bytes;
-    if (in)
-        bytes.assign(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+    if (in) {
+        // In one piece where the size is known; whatever else the file holds
+        // by the time it is read, byte by byte.
+        std::error_code unknown;
+        auto size = static_cast<std::streamsize>(std::filesystem::file_size(path, unknown));
+        if (!unknown && size > 0) {
+            bytes.resize(static_cast<size_t>(size));
+            in.read(bytes.data(), size);
+            bytes.resize(static_cast<size_t>(in.gcount()));
+        }
+        if (!in.bad()) {
+            in.clear();
+            bytes.append(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
+        }
+    }
     if (!in.is_open() || in.bad()) {
         logEngineProblem(std::string("snapshot monitor: instance.json: snapshots.") +
                          kindName(served.kind) + ".streamFile: cannot read " + path.string());
