@@ -1,6 +1,6 @@
 # The two quick-start commands are `make run` and `make test`; each one
 # installs what is missing, configures and builds first.
-.PHONY: all deps build run test asan test-asan fuzz fuzz-ci coverage-deps coverage install format clean
+.PHONY: all deps build run test asan test-asan fuzz fuzz-ci coverage-deps coverage bench-deps bench install format clean
 
 FUZZ_SECONDS ?= 60
 PREFIX ?= /usr/local
@@ -61,6 +61,21 @@ coverage: coverage-deps build-coverage/build.ninja
 	gcovr $(COVERAGE_FLAGS) --branches --print-summary \
 	      --fail-under-line 95 --fail-under-branch 85 build-coverage
 
+# Google Benchmark, GNU time and strace serve the measurements only.
+bench-deps:
+	@VRX_EXTRA_DEPS="libbenchmark-dev:/usr/include/benchmark/benchmark.h time:/usr/bin/time strace:/usr/bin/strace" \
+	  bash scripts/install-deps.sh
+
+build-bench/build.ninja: | bench-deps
+	cmake --preset bench
+
+# Benchmarks of the program's own work and of the engine's encoding, then
+# whole runs on generated instances of 1,000 to 100,000 applications with
+# their floors; prints one table and the targets (docs/performance.md).
+bench: bench-deps build-bench/build.ninja
+	cmake --build --preset bench
+	bash scripts/bench.sh build-bench
+
 install: build
 	cmake --install build --prefix $(PREFIX)
 
@@ -68,4 +83,4 @@ format:
 	git ls-files '*.cpp' '*.h' | xargs clang-format -i
 
 clean:
-	rm -rf build build-asan build-fuzz build-coverage
+	rm -rf build build-asan build-fuzz build-coverage build-bench
