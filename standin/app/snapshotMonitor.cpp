@@ -227,23 +227,29 @@ int32_t encodeInto(const Served& served, StreamScope scope, char* out, uint32_t 
     return 0;
 }
 
+// What both entry points check and read before they answer: the stream's
+// addressing, the object asked for, and the instance that serves it.
+int32_t openRequest(uint32_t streamVersion, int32_t partition, uint32_t selector,
+                    const MonRequest* request, Served& served) {
+    if (int32_t rc = checkAddressing(streamVersion, partition, selector))
+        return rc;
+    SnapshotKind kind;
+    if (int32_t rc = checkObject(request, &kind))
+        return rc;
+    return loadServed(kind, served);
+}
+
 int32_t getSnapshotSize(uint32_t version, MonSizeRequest* request, sqlca* ca) {
     if (version != VRX_MONITOR_VERSION)
         return kMonBadInterfaceVersion;
     if (request == nullptr || ca == nullptr || request->estimate == nullptr) {
         return kMonBadArgument;
     }
-    if (int32_t rc =
-            checkAddressing(request->streamVersion, request->partition, request->selector)) {
+    Served served;
+    if (int32_t rc = openRequest(request->streamVersion, request->partition, request->selector,
+                                 request->request, served)) {
         return rc;
     }
-    SnapshotKind kind;
-    if (int32_t rc = checkObject(request->request, &kind))
-        return rc;
-
-    Served served;
-    if (int32_t rc = loadServed(kind, served))
-        return rc;
     const SnapshotAnswer& shape = served.shape();
     answer(ca, kSqlOk);
     *request->estimate = 0;
@@ -270,17 +276,11 @@ int32_t getSnapshot(uint32_t version, MonSnapshotRequest* request, sqlca* ca) {
         return kMonBadArgument;
     if (request->flags != 0)
         return kMonBadArgument;
-    if (int32_t rc =
-            checkAddressing(request->streamVersion, request->partition, request->selector)) {
+    Served served;
+    if (int32_t rc = openRequest(request->streamVersion, request->partition, request->selector,
+                                 request->request, served)) {
         return rc;
     }
-    SnapshotKind kind;
-    if (int32_t rc = checkObject(request->request, &kind))
-        return rc;
-
-    Served served;
-    if (int32_t rc = loadServed(kind, served))
-        return rc;
     const SnapshotAnswer& shape = served.shape();
     answer(ca, kSqlOk);
     if (shape.takeRc != 0)
