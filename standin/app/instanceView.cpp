@@ -13,6 +13,7 @@ std::shared_ptr<const InstanceView>& gView = *new std::shared_ptr<const Instance
 }  // namespace
 
 std::shared_ptr<const InstanceView> readInstanceView(const std::string& dir, StreamSizer& sink) {
+    vrxStandinNoteInstanceRequest();
     auto view = std::make_shared<InstanceView>();
     view->dir = dir;
     view->valid = readInstanceFile(dir.c_str(), view->settings, sink, view->error, &view->stamp);
@@ -23,6 +24,7 @@ std::shared_ptr<const InstanceView> readInstanceView(const std::string& dir, Str
 }
 
 std::shared_ptr<const InstanceView> instanceView(const std::string& dir) {
+    vrxStandinNoteInstanceRequest();
     std::shared_ptr<const InstanceView> kept;
     {
         std::lock_guard lock(gViewMutex);

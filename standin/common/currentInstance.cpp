@@ -21,6 +21,7 @@ namespace {
 struct Cache {
     bool loaded = false;
     std::string dir;
+    uint64_t requests = 0;  // vrxStandinInstanceRequests() when last checked
     FileStamp stamp;
     // The answer before the last reload stays alive too, so that a reference
     // taken by a caller survives a reload triggered by a service it calls.
@@ -118,8 +119,9 @@ const Instance& currentInstance() {
     static std::mutex& mutex = *new std::mutex;
     std::lock_guard lock(mutex);
 
-    // Services ask for every pool and message; a check of the file's status
-    // is all that each call costs while the file stays as it was read.
+    // Services ask for every pool and message: between two requests of the
+    // client library a call costs no file system call at all, and after one
+    // a check of the file's status while the file stays as it was read.
     char dir[PATH_MAX];
     char file[PATH_MAX + 32];
     FixedText path(file, sizeof file);
@@ -127,13 +129,17 @@ const Instance& currentInstance() {
     bool usable = instanceDirectoryPath(dir, sizeof dir);
     if (usable)
         usable = !path.add(dir).add("/instance.json").overflow();
+    uint64_t requests = vrxStandinInstanceRequests();
     if (cache.loaded && cache.dir == dir &&
-        (usable ? stillCurrent(file, cache.stamp) : !cache.stamp.exists)) {
+        (requests == cache.requests ||
+         (usable ? stillCurrent(file, cache.stamp) : !cache.stamp.exists))) {
+        cache.requests = requests;
         return *cache.instance;
     }
 
     cache.loaded = true;
     cache.dir = dir;
+    cache.requests = requests;
     cache.stamp = FileStamp{};
     auto instance = std::make_unique<Instance>();
     InstanceSink poolsNotKept;

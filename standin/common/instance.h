@@ -103,12 +103,13 @@ bool parseInstance(const std::string& content, Instance& out, std::string& error
 
 // The instance as the system services see it: its settings, without the
 // pool lists (pools, databases, applications and private memory stay empty;
-// only the snapshot monitor reads them). Loaded on first use and again
-// whenever the instance directory or its instance.json may have changed
-// (path, size, times), so that a process that switches VRX_INSTANCE_DIR, or
-// an edited file, is followed. The defaults when the file cannot be read or
-// is not valid. The reference stays valid across one further reload, so
-// holding it while calling another service is safe. Not for signal handlers.
+// only the snapshot monitor reads them). Loaded on first use; checked again
+// (path, size, times) when the instance directory changes or after the
+// client library's next request (set-up or snapshot), so that a process that
+// switches VRX_INSTANCE_DIR, or a file edited between snapshots, is
+// followed. The defaults when the file cannot be read or is not valid. The
+// reference stays valid across one further reload, so holding it while
+// calling another service is safe. Not for signal handlers.
 const Instance& currentInstance();
 
 // faults.registryWrite of the instance in `dir`, for the registry write that
@@ -124,3 +125,12 @@ std::optional<int32_t> registryWriteFault(const char* dir);
 std::filesystem::path dataDirectory();
 
 }  // namespace standin
+
+// The requests of the client library that read instance.json (set-up,
+// snapshot size, snapshot): the client library notes each one, and the
+// system services look at their files again only when the count has grown.
+// Kept by the system services' library; not part of the engine's interface.
+extern "C" {
+void vrxStandinNoteInstanceRequest(void);
+uint64_t vrxStandinInstanceRequests(void);
+}

@@ -3,6 +3,8 @@
 #include <limits.h>
 
 #include <cstdlib>
+#include <mutex>
+#include <unordered_map>
 
 #include "common/fixedText.h"
 #include "common/instance.h"
@@ -59,9 +61,9 @@ std::string messageLocale() {
     return {};
 }
 
-std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid) {
-    if (!isPlainFileName(catalogName))
-        return std::nullopt;
+namespace {
+
+std::optional<std::string> searchCatalogs(std::string_view catalogName, std::string_view msgid) {
     // Worked out once: the data directory cannot move while the library is
     // loaded.
     static const std::string locales = (dataDirectory() / "locale").string();
@@ -96,6 +98,46 @@ std::optional<std::string> findCatalogText(std::string_view catalogName, std::st
     if (!englishListed)
         return textIn(locales, kEnglish);
     return std::nullopt;
+}
+
+// The answers found since the catalogs were last looked at: a run asks for
+// the same few messages again and again, and the catalogs (like
+// instance.json) are looked at again after each request of the client
+// library, or when the instance directory or the locale changes.
+struct AnswerCache {
+    uint64_t requests = 0;
+    std::string instance;
+    std::string locale;
+    std::unordered_map<std::string, std::optional<std::string>> answers;
+};
+
+}  // namespace
+
+std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid) {
+    if (!isPlainFileName(catalogName))
+        return std::nullopt;
+    static std::mutex& mutex = *new std::mutex;
+    static AnswerCache& cache = *new AnswerCache;
+    std::lock_guard lock(mutex);
+
+    char instance[PATH_MAX];
+    if (!instanceDirectoryPath(instance, sizeof instance))
+        instance[0] = '\0';
+    uint64_t requests = vrxStandinInstanceRequests();
+    std::string locale = messageLocale();
+    if (requests != cache.requests || cache.instance != instance || cache.locale != locale) {
+        cache.answers.clear();
+        cache.requests = requests;
+        cache.instance = instance;
+        cache.locale = std::move(locale);
+    }
+    std::string key;
+    key.reserve(catalogName.size() + 1 + msgid.size());
+    key.append(catalogName).append(1, '/').append(msgid);
+    auto found = cache.answers.find(key);
+    if (found == cache.answers.end())
+        found = cache.answers.emplace(std::move(key), searchCatalogs(catalogName, msgid)).first;
+    return found->second;
 }
 
 }  // namespace standin

@@ -24,7 +24,9 @@ std::string messageLocale();
 // The text of `msgid` from the first catalog that holds it, trying in order
 // <instance>/msg/<name>, <data>/locale/<candidate>/<name> for each locale
 // candidate and <data>/locale/en/<name>. A missing or damaged catalog is
-// passed over; a name that is not a plain file name finds nothing.
+// passed over; a name that is not a plain file name finds nothing. Answers
+// are kept until the client library's next request (set-up or snapshot), or
+// until the instance directory or the locale changes.
 std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid);
 
 }  // namespace standin

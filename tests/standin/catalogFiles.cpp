@@ -79,6 +79,7 @@ void MessageTest::removeInstalledCatalogs() {
     for (const auto& dir : installed_)
         fs::remove_all(dir, ec);
     installed_.clear();
+    vrxStandinNoteInstanceRequest();
 }
 
 void MessageTest::TearDown() {
@@ -100,6 +101,8 @@ std::string MessageTest::installCatalog(const std::string& locale, const std::st
     fs::create_directories(dir);
     installed_.push_back(dir);
     std::ofstream(dir / catalog, std::ios::binary) << buildMo(entries);
+    // Catalogs are looked at again after the client library's next request.
+    vrxStandinNoteInstanceRequest();
     return name;
 }
 

@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "common/instance.h"
 #include "testInstance.h"
 
 namespace mtrktest {

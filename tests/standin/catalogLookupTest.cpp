@@ -122,6 +122,7 @@ TEST_F(CatalogLookupTest, TheInstanceCatalogComesFirstAndFollowsItsFile) {
     instanceCatalog("probe.mo", {{"7", "a new and longer text"}});
     EXPECT_EQ(fetch("probe.mo", 7).text, "a new and longer text");
     std::filesystem::remove(instance_->dir() / "msg" / "probe.mo");
+    vrxStandinNoteInstanceRequest();
     EXPECT_EQ(fetch("probe.mo", 7).text, "installed");
     // Another instance has catalogs of its own.
     TempInstance other(false);

@@ -6,6 +6,7 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <fstream>
 #include <optional>
 #include <string>
 #include <utility>
@@ -238,7 +239,10 @@ TEST_F(InstanceDirectoryTest, SignalSafeFormRefusesWhatDoesNotFit) {
 
 using CurrentInstanceTest = EnvironmentGuard;
 
-TEST_F(CurrentInstanceTest, FollowsSwitchesAndEdits) {
+// The services follow a switch of VRX_INSTANCE_DIR at once, and an edit of
+// instance.json after the client library's next request, as the monitor
+// shows it; between requests they keep what they read.
+TEST_F(CurrentInstanceTest, FollowsSwitchesAndEditsAfterARequest) {
     mtrktest::TempInstance first(false);
     mtrktest::TempInstance second(false);
     first.writeJson(R"({"maxPoolId": 11})");
@@ -247,8 +251,11 @@ TEST_F(CurrentInstanceTest, FollowsSwitchesAndEdits) {
     EXPECT_EQ(standin::currentInstance().maxPoolId, 11u);
     second.activate();
     EXPECT_EQ(standin::currentInstance().maxPoolId, 22u);
-    // An edit of the same size right after the last one is still seen.
-    second.writeJson(R"({"maxPoolId": 33})");
+    // Written past the test support, which would note a request.
+    std::ofstream(second.dir() / "instance.json", std::ios::trunc) << R"({"maxPoolId": 33})";
+    EXPECT_EQ(standin::currentInstance().maxPoolId, 22u);
+    // An edit of the same size right after the last read is still seen.
+    vrxStandinNoteInstanceRequest();
     EXPECT_EQ(standin::currentInstance().maxPoolId, 33u);
     // A file that is not valid gives the defaults, and a repaired one is
     // read again.
@@ -257,6 +264,7 @@ TEST_F(CurrentInstanceTest, FollowsSwitchesAndEdits) {
     second.writeJson(R"({"maxPoolId": 55})");
     EXPECT_EQ(standin::currentInstance().maxPoolId, 55u);
     fs::remove(second.dir() / "instance.json");
+    vrxStandinNoteInstanceRequest();
     EXPECT_FALSE(standin::currentInstance().maxPoolId);
 }
 
