@@ -17,6 +17,7 @@ std::shared_ptr<const InstanceView> readInstanceView(const std::string& dir, Str
     auto view = std::make_shared<InstanceView>();
     view->dir = dir;
     view->valid = readInstanceFile(dir.c_str(), view->settings, sink, view->error, &view->stamp);
+    vrxStandinOfferInstance(dir.c_str(), &view->stamp, view->valid ? &view->settings : nullptr);
     view->sizes = sink.sizes();
     std::lock_guard lock(gViewMutex);
     gView = view;

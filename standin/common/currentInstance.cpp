@@ -123,16 +123,17 @@ const Instance& currentInstance() {
     // client library a call costs no file system call at all, and after one
     // a check of the file's status while the file stays as it was read.
     char dir[PATH_MAX];
-    char file[PATH_MAX + 32];
-    FixedText path(file, sizeof file);
     // Without an instance directory there is no file, and the defaults hold.
     bool usable = instanceDirectoryPath(dir, sizeof dir);
+    uint64_t requests = vrxStandinInstanceRequests();
+    if (cache.loaded && requests == cache.requests && cache.dir == dir)
+        return *cache.instance;
+    char file[PATH_MAX + 32];
+    FixedText path(file, sizeof file);
     if (usable)
         usable = !path.add(dir).add("/instance.json").overflow();
-    uint64_t requests = vrxStandinInstanceRequests();
     if (cache.loaded && cache.dir == dir &&
-        (requests == cache.requests ||
-         (usable ? stillCurrent(file, cache.stamp) : !cache.stamp.exists))) {
+        (usable ? stillCurrent(file, cache.stamp) : !cache.stamp.exists)) {
         cache.requests = requests;
         return *cache.instance;
     }
@@ -144,8 +145,15 @@ const Instance& currentInstance() {
     auto instance = std::make_unique<Instance>();
     InstanceSink poolsNotKept;
     std::string error;
-    if (!usable || !readInstanceFile(dir, *instance, poolsNotKept, error, &cache.stamp))
-        *instance = Instance{};
+    // The client library's last read serves while the file is still the
+    // one it read: a large instance is not read once more for its settings.
+    bool offered = usable && vrxStandinOfferedInstance(dir, &cache.stamp, instance.get()) &&
+                   stillCurrent(file, cache.stamp);
+    if (!offered) {
+        cache.stamp = FileStamp{};
+        if (!usable || !readInstanceFile(dir, *instance, poolsNotKept, error, &cache.stamp))
+            *instance = Instance{};
+    }
     cache.previous = std::move(cache.instance);
     cache.instance = std::move(instance);
     publish(dir, cache.stamp.exists, cache.stamp.st, *cache.instance);

@@ -87,3 +87,15 @@ bool readInstanceFile(const char* dir, Instance& settings, InstanceSink& sink, s
                       FileStamp* stamp);
 
 }  // namespace standin
+
+// Kept by the system services' library (not part of the engine's
+// interface): the client library offers the settings of each read of
+// instance.json that it makes, with the file's stamp; the services take
+// them while the file is still the one read. Settings are the defaults when
+// the file was not valid.
+extern "C" {
+void vrxStandinOfferInstance(const char* dir, const standin::FileStamp* stamp,
+                             const standin::Instance* settings);
+bool vrxStandinOfferedInstance(const char* dir, standin::FileStamp* stamp,
+                               standin::Instance* settings);
+}

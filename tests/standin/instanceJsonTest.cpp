@@ -13,6 +13,8 @@
 #include <vector>
 
 #include "common/instance.h"
+#include "engine/vrxapp.h"
+#include "engine/vrxsys.h"
 #include "testInstance.h"
 
 namespace {
@@ -266,6 +268,21 @@ TEST_F(CurrentInstanceTest, FollowsSwitchesAndEditsAfterARequest) {
     fs::remove(second.dir() / "instance.json");
     vrxStandinNoteInstanceRequest();
     EXPECT_FALSE(standin::currentInstance().maxPoolId);
+}
+
+// The services take the settings that the client library's set-up read,
+// but only while the file is still the one it read.
+TEST_F(CurrentInstanceTest, TakesTheClientLibrarysReadOnlyWhileTheFileIsUnchanged) {
+    mtrktest::TempInstance instance(false);
+    instance.writeJson(R"({"maxPoolId": 11})");
+    instance.activate();
+    ASSERT_EQ(sqleInitApplicationEnvironment(0, 0, 1, nullptr), 0);
+    EXPECT_EQ(sqloGetMaxMemPoolID(), 11u);
+    std::ofstream(instance.dir() / "instance.json", std::ios::trunc) << R"({"maxPoolId": 222})";
+    vrxStandinNoteInstanceRequest();
+    EXPECT_EQ(sqloGetMaxMemPoolID(), 222u);
+    ASSERT_EQ(sqleInitApplicationEnvironment(0, 0, 1, nullptr), 0);
+    EXPECT_EQ(sqloGetMaxMemPoolID(), 222u);
 }
 
 }  // namespace
