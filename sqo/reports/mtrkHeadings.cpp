@@ -17,7 +17,8 @@ int32_t mtrkPrintNotice(uint32_t messageNumber) {
 }
 
 int32_t mtrkPrintHeading(uint32_t messageNumber, const char* text) {
-    char message[MTRK_TEXT_SIZE] = {};
+    // Cleared whole by the fetch before the message service writes into it.
+    char message[MTRK_TEXT_SIZE];
     uint32_t traceFlags = mtrkTraceEntry(MTRK_FID_PRINT_HEADING);
     int32_t rc = mtrkGetMessage(messageNumber, message, sizeof message, 1, text);
     if (rc == 0) {
@@ -29,7 +30,8 @@ int32_t mtrkPrintHeading(uint32_t messageNumber, const char* text) {
 
 int32_t mtrkPrintNumberedHeading(uint32_t functionId, uint16_t numberElement,
                                  uint32_t messageNumber, const char* start, uint32_t length) {
-    char message[MTRK_TEXT_SIZE] = {};
+    // Cleared whole by the fetch before the message service writes into it.
+    char message[MTRK_TEXT_SIZE];
     char number[MTRK_NUMBER_SIZE] = {};
     uint32_t traceFlags = mtrkTraceEntry(functionId);
     uint32_t sectionNumber = 0;
