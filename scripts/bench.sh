@@ -8,7 +8,7 @@
 #   scripts/bench.sh [build-dir]            (default build-bench)
 #
 #   BENCH_SIZES     applications of the generated instances ("1000 10000 100000")
-#   BENCH_REPEAT    runs of every whole-run measurement; the median counts (3)
+#   BENCH_REPEAT    runs of every whole-run measurement; the best counts (5)
 #   BENCH_MIN_TIME  minimum seconds of each benchmark (0.2)
 #   BENCH_FILTER    which benchmarks run (all)
 set -euo pipefail
@@ -16,9 +16,10 @@ set -euo pipefail
 build=${1:-build-bench}
 bin=$build/bin
 sizes=${BENCH_SIZES:-1000 10000 100000}
-repeat=${BENCH_REPEAT:-3}
-for tool in vrxmtrk vrxmkinstance vrxbench_snapshots vrxbench_write mtrk_bench; do
-  [ -x "$bin/$tool" ] || { echo "bench.sh: $bin/$tool is missing; build with the bench preset" >&2; exit 1; }
+repeat=${BENCH_REPEAT:-5}
+split=$build/lib/libvrxbench_split.so
+for tool in $bin/vrxmtrk $bin/vrxmkinstance $bin/vrxbench_snapshots $bin/vrxbench_write $bin/mtrk_bench $split; do
+  [ -e "$tool" ] || { echo "bench.sh: $tool is missing; build with the bench preset" >&2; exit 1; }
 done
 [ -x /usr/bin/time ] || { echo "bench.sh: /usr/bin/time is missing (package time)" >&2; exit 1; }
 
@@ -31,48 +32,57 @@ echo
 "$bin/mtrk_bench" --benchmark_color=false --benchmark_min_time="${BENCH_MIN_TIME:-0.2}" \
   ${BENCH_FILTER:+--benchmark_filter="$BENCH_FILTER"}
 
-# The median of the numbers on standard input.
-median() { sort -g | awk '{ v[NR] = $1 } END { print (NR % 2) ? v[(NR + 1) / 2] : (v[NR / 2] + v[NR / 2 + 1]) / 2 }'; }
+# The least and the greatest of the numbers on standard input.
+least() { sort -g | head -n 1; }
+greatest() { sort -g | tail -n 1; }
 
-# measure NAME COMMAND...: runs the command `repeat` times and leaves the
-# medians of wall, CPU (user + system) and peak resident kilobytes in
-# $work/NAME.{wall,cpu,rss}. The first run's standard output is kept in
-# $work/NAME.out; the others go to /dev/null.
-measure() {
+# time_once NAME COMMAND...: runs the command once under /usr/bin/time and
+# appends "wall user system peak-KiB" to $work/NAME.runs. The first run's
+# standard output is kept in $work/NAME.out; the others go to /dev/null.
+time_once() {
   local name=$1; shift
-  : > "$work/$name.runs"
-  for i in $(seq "$repeat"); do
-    local out=/dev/null
-    [ "$i" -eq 1 ] && out=$work/$name.out
-    /usr/bin/time -f '%e %U %S %M' -o "$work/time" "$@" > "$out"
-    cat "$work/time" >> "$work/$name.runs"
-  done
-  awk '{ print $1 }' "$work/$name.runs" | median > "$work/$name.wall"
-  awk '{ print $2 + $3 }' "$work/$name.runs" | median > "$work/$name.cpu"
-  awk '{ print $4 }' "$work/$name.runs" | median > "$work/$name.rss"
+  local out=/dev/null
+  [ -e "$work/$name.out" ] || out=$work/$name.out
+  /usr/bin/time -f '%e %U %S %M' -o "$work/time" "$@" > "$out"
+  cat "$work/time" >> "$work/$name.runs"
+}
+
+# summarise NAME: the best wall and CPU (user + system) time of the runs and
+# the largest peak resident kilobytes, in $work/NAME.{wall,cpu,rss}. The
+# best of several runs is the one least disturbed by the rest of the
+# machine; the peak memory is the worst seen.
+summarise() {
+  local name=$1
+  awk '{ print $1 }' "$work/$name.runs" | least > "$work/$name.wall"
+  awk '{ print $2 + $3 }' "$work/$name.runs" | least > "$work/$name.cpu"
+  awk '{ print $4 }' "$work/$name.runs" | greatest > "$work/$name.rss"
 }
 
 commands=("-i -d -a -p" "-a -v")
 snapshotsOf=("instance database application database application" "application database")
 
 # A record per whole run: apps, command index, pools, wall, CPU, peak KiB,
-# largest snapshot bytes, snapshot floor CPU, and the CPU of writing the
-# output bytes plainly and through one formatted print per line.
+# largest snapshot bytes, the snapshot floor's CPU, the CPU of writing the
+# output bytes plainly and through one formatted print per line, and the
+# in-run split: the engine's share (start-up and snapshot calls) and the
+# program's own work.
 report_row() {
   echo "$1" | awk '{
-    cmd = $2 ? "-a -v" : "-i -d -a -p"; own = $5 - $8; if (own < 0) own = 0
-    printf "%-8s %-12s %8d %7.2f %7.2f %8.2f %8.1f %8.1f %8.1f %8.2f %8.3f %8.3f %8.2f %9.1f %9.1f\n",
+    cmd = $2 ? "-a -v" : "-i -d -a -p"
+    printf "%-8s %-12s %8d %7.2f %7.2f %8.2f %8.1f %8.1f %8.1f %8.2f %8.2f %8.3f %8.3f %8.3f %9.1f %9.1f\n",
            $1, cmd, $3, $4, $5, $5 / $3 * 1e6, $6 / 1024, $7 / 1048576, 1.25 * $7 / 1048576 + 16,
-           $8, $9, $10, own, ($9 > 0 ? own / $9 : 0), ($10 > 0 ? own / $10 : 0)
+           $8, $11, $12, $9, $10, ($9 > 0 ? $12 / $9 : 0), ($10 > 0 ? $12 / $10 : 0)
   }'
 }
 
 echo
-echo "== Whole runs, median of $repeat (CPU = user + system; own = run CPU - snapshot floor CPU;"
-echo "   write/print = CPU of writing the output bytes plainly / with one printf per line)"
-printf '%-8s %-12s %8s %7s %7s %8s %8s %8s %8s %8s %8s %8s %8s %9s %9s\n' \
-  apps command pools "wall s" "CPU s" "us/pool" "RSS MiB" "snap MiB" "limit" "snaps s" \
-  "write s" "print s" "own s" "own/write" "own/print"
+echo "== Whole runs, best of $repeat (CPU = user + system). floor: the snapshot calls alone, in a"
+echo "   process of their own; engine/own: the run's CPU split from within the run (libvrxbench_split):"
+echo "   the engine's start-up and snapshot calls, and the rest, the program's own work;"
+echo "   write/print: CPU of writing the output bytes plainly / with one printf per line"
+printf '%-8s %-12s %8s %7s %7s %8s %8s %8s %8s %8s %8s %8s %8s %8s %9s %9s\n' \
+  apps command pools "wall s" "CPU s" "us/pool" "RSS MiB" "snap MiB" "limit" "floor s" \
+  "engine s" "own s" "write s" "print s" "own/write" "own/print"
 for apps in $sizes; do
   dir=$work/i$apps
   mkdir -p "$dir"
@@ -80,18 +90,26 @@ for apps in $sizes; do
   for c in 0 1; do
     cmd=${commands[$c]}
     tag=$apps.$c
-    measure run.$tag env VRX_INSTANCE_DIR="$dir" "$bin/vrxmtrk" $cmd
-    measure snap.$tag env VRX_INSTANCE_DIR="$dir" "$bin/vrxbench_snapshots" ${snapshotsOf[$c]}
-    : > "$work/write.$tag.runs"
+    # A run and its floors take turns, so that a change in the machine's
+    # load between them weighs on all three alike.
     for _ in $(seq "$repeat"); do
+      time_once run.$tag env VRX_INSTANCE_DIR="$dir" "$bin/vrxmtrk" $cmd
+      time_once snap.$tag env VRX_INSTANCE_DIR="$dir" "$bin/vrxbench_snapshots" ${snapshotsOf[$c]}
       "$bin/vrxbench_write" "$work/run.$tag.out" 2>> "$work/write.$tag.runs" > /dev/null
+      LD_PRELOAD=$split VRXBENCH_SPLIT=$work/split VRX_INSTANCE_DIR="$dir" "$bin/vrxmtrk" $cmd > /dev/null
+      awk -F'[= ]' '{ printf "%.6f %.6f\n", $6 - $2 - $4, $2 + $4 }' "$work/split" >> "$work/split.$tag.runs"
     done
-    raw=$(sed 's/.*raw=\([0-9.]*\).*/\1/' "$work/write.$tag.runs" | median)
-    formatted=$(sed 's/.*formatted=\([0-9.]*\).*/\1/' "$work/write.$tag.runs" | median)
+    # The run whose own work was least disturbed, with its engine share.
+    read -r own engine < <(sort -g "$work/split.$tag.runs" | head -n 1)
+    summarise run.$tag
+    summarise snap.$tag
+    raw=$(sed 's/.*raw=\([0-9.]*\).*/\1/' "$work/write.$tag.runs" | least)
+    formatted=$(sed 's/.*formatted=\([0-9.]*\).*/\1/' "$work/write.$tag.runs" | least)
     largest=$(sed 's/.*largest=\([0-9]*\).*/\1/' "$work/snap.$tag.out")
     pools=$(sed 's/.*pools=\([0-9]*\).*/\1/' "$work/snap.$tag.out")
     echo "$apps $c $pools $(cat "$work/run.$tag.wall") $(cat "$work/run.$tag.cpu")" \
          "$(cat "$work/run.$tag.rss") $largest $(cat "$work/snap.$tag.cpu") $raw $formatted" \
+         "$engine $own" \
          >> "$work/records"
     report_row "$(tail -n 1 "$work/records")"
   done
@@ -106,8 +124,8 @@ awk -v first="$(echo $sizes | awk '{ print $(NF - 1) }')" -v last="$(echo $sizes
     printf "  memory   %7s apps %-12s peak %6.1f MiB, limit 1.25 x %.1f + 16 = %.1f MiB: %s\n",
            apps, name(c), rss, largest, limit, (rss <= limit ? "holds" : "MISSES")
     if (c == 0 && $9 > 0 && $10 > 0) {
-      own = $5 - $8
-      printf "  own work %7s apps %-12s %.1f s = %.0f x writing its bytes, %.1f x printing its lines (at most 4): %s\n",
+      own = $12
+      printf "  own work %7s apps %-12s %.2f s = %.1f x writing its bytes, %.1f x printing its lines (at most 4): %s\n",
              apps, name(c), own, own / $9, own / $10, (own / $10 <= 4 ? "holds" : "MISSES")
     }
     runCpu[apps "|" c] = $5
