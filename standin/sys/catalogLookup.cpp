@@ -3,6 +3,7 @@
 #include <limits.h>
 
 #include <cstdlib>
+#include <memory>
 #include <mutex>
 #include <unordered_map>
 
@@ -108,14 +109,15 @@ struct AnswerCache {
     uint64_t requests = 0;
     std::string instance;
     std::string locale;
-    std::unordered_map<std::string, std::optional<std::string>> answers;
+    std::unordered_map<std::string, std::shared_ptr<const std::string>> answers;
 };
 
 }  // namespace
 
-std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid) {
+std::shared_ptr<const std::string> findCatalogText(std::string_view catalogName,
+                                                   std::string_view msgid) {
     if (!isPlainFileName(catalogName))
-        return std::nullopt;
+        return nullptr;
     static std::mutex& mutex = *new std::mutex;
     static AnswerCache& cache = *new AnswerCache;
     std::lock_guard lock(mutex);
@@ -135,8 +137,12 @@ std::optional<std::string> findCatalogText(std::string_view catalogName, std::st
     key.reserve(catalogName.size() + 1 + msgid.size());
     key.append(catalogName).append(1, '/').append(msgid);
     auto found = cache.answers.find(key);
-    if (found == cache.answers.end())
-        found = cache.answers.emplace(std::move(key), searchCatalogs(catalogName, msgid)).first;
+    if (found == cache.answers.end()) {
+        std::shared_ptr<const std::string> answer;
+        if (auto text = searchCatalogs(catalogName, msgid))
+            answer = std::make_shared<const std::string>(std::move(*text));
+        found = cache.answers.emplace(std::move(key), std::move(answer)).first;
+    }
     return found->second;
 }
 

@@ -2,6 +2,7 @@
 // first, then the installed ones for the user's locale, then English.
 #pragma once
 
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -27,6 +28,8 @@ std::string messageLocale();
 // passed over; a name that is not a plain file name finds nothing. Answers
 // are kept until the client library's next request (set-up or snapshot), or
 // until the instance directory or the locale changes.
-std::optional<std::string> findCatalogText(std::string_view catalogName, std::string_view msgid);
+// Null when no catalog holds it.
+std::shared_ptr<const std::string> findCatalogText(std::string_view catalogName,
+                                                   std::string_view msgid);
 
 }  // namespace standin

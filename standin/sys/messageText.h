@@ -5,17 +5,18 @@
 #include <cstddef>
 #include <string>
 #include <string_view>
+#include <utility>
 
 namespace standin {
 
 // Replaces %1 and %2 by insert(0) and insert(1), in one pass, so that an
 // insert's own text is never read as a placeholder; %% stands for one %;
 // every other character, a lone % included, is copied. `insert` is called
-// only for the placeholders that the text holds, once per occurrence.
+// only for the placeholders that the text holds, once per occurrence. The
+// result replaces what `out` held.
 template <typename InsertFn>
-std::string expandInserts(std::string_view text, InsertFn&& insert) {
-    std::string out;
-    out.reserve(text.size());
+void expandInserts(std::string& out, std::string_view text, InsertFn&& insert) {
+    out.clear();
     for (size_t i = 0; i < text.size(); ++i) {
         char c = text[i];
         if (c == '%' && i + 1 < text.size()) {
@@ -33,6 +34,14 @@ std::string expandInserts(std::string_view text, InsertFn&& insert) {
         }
         out += c;
     }
+}
+
+// The same, as a new text.
+template <typename InsertFn>
+std::string expandInserts(std::string_view text, InsertFn&& insert) {
+    std::string out;
+    out.reserve(text.size());
+    expandInserts(out, text, std::forward<InsertFn>(insert));
     return out;
 }
 

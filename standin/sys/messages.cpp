@@ -51,11 +51,14 @@ extern "C" VRX_EXPORT int32_t sqlogmsg(const char* catalog, uint32_t number,
     if (messageFails(number))
         return standin::kMessageUnavailable;
     auto text = standin::findCatalogText(catalog, std::to_string(number));
-    if (!text)
+    if (text == nullptr)
         return standin::kMessageNotFound;
 
     unsigned entries = insertEntries(insertLengths, inserts);
-    std::string message = standin::expandInserts(*text, [&](unsigned index) -> std::string_view {
+    // Composed in a buffer that each thread keeps, so that a message costs
+    // no allocation once the longest one has been composed.
+    thread_local std::string message;
+    standin::expandInserts(message, *text, [&](unsigned index) -> std::string_view {
         if (inserts == nullptr || index >= entries || inserts[index] == nullptr)
             return {};
         const char* insert = inserts[index];
