@@ -30,20 +30,36 @@ struct BlockRecord {
 };
 
 struct ReleasedRecord {
+    const void* address = nullptr;
     BlockRecord block;
     std::string releasedFile;
-    uint32_t releasedLine;
+    uint32_t releasedLine = 0;
 };
 
-// Addresses come back from malloc again and again; remembering this many
-// released ones is plenty to tell a double release from a foreign pointer.
+// Addresses come back from malloc again and again; remembering the last
+// this many releases is plenty to tell a double release from a foreign
+// pointer.
 constexpr size_t kReleasedRemembered = 4096;
 
 struct Tracker {
     std::mutex mutex;
     std::unordered_map<const void*, BlockRecord> held;
-    std::unordered_map<const void*, ReleasedRecord> released;
+    // The last releases, oldest overwritten first. An address handed out
+    // again stays in it: only a block that is not held is looked up here,
+    // and then its latest release is the one that counts.
+    std::vector<ReleasedRecord> released = std::vector<ReleasedRecord>(kReleasedRemembered);
+    size_t nextReleased = 0;
     uint64_t serial = 0;
+
+    const ReleasedRecord* lastRelease(const void* block) const {
+        for (size_t i = 0; i < released.size(); ++i) {
+            const ReleasedRecord& r =
+                released[(nextReleased + released.size() - 1 - i) % released.size()];
+            if (r.address != nullptr && r.address == block)
+                return &r;
+        }
+        return nullptr;
+    }
 };
 
 // Never destroyed: the leak report at exit, and programs that release blocks
@@ -128,7 +144,6 @@ extern "C" VRX_EXPORT int32_t sqlogmblkEx(uint32_t /*pool*/, uint64_t size, uint
     Tracker& t = tracker();
     {
         std::lock_guard lock(t.mutex);
-        t.released.erase(memory);
         t.held[memory] = BlockRecord{file != nullptr ? file : "?", line, size, t.serial++};
     }
     *block = memory;
@@ -142,17 +157,18 @@ extern "C" VRX_EXPORT int32_t sqlofmblkEx(const char* file, uint32_t line, void*
         std::lock_guard lock(t.mutex);
         auto it = t.held.find(block);
         if (it != t.held.end()) {
-            if (t.released.size() >= kReleasedRemembered)
-                t.released.clear();
-            t.released[block] =
-                ReleasedRecord{std::move(it->second), file != nullptr ? file : "?", line};
+            ReleasedRecord& r = t.released[t.nextReleased];
+            t.nextReleased = (t.nextReleased + 1) % t.released.size();
+            r.address = block;
+            r.block = std::move(it->second);
+            r.releasedFile = file != nullptr ? file : "?";
+            r.releasedLine = line;
             t.held.erase(it);
             std::free(block);
             return 0;
         }
-        auto before = t.released.find(block);
-        if (before != t.released.end()) {
-            const ReleasedRecord& r = before->second;
+        if (const ReleasedRecord* before = t.lastRelease(block)) {
+            const ReleasedRecord& r = *before;
             problem = "Memory block released twice: " + place(file, line) + ", block " +
                       address(block) + " of " + std::to_string(r.block.size) + " bytes from " +
                       r.block.file + ":" + std::to_string(r.block.line) + ", already released at " +

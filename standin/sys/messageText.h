@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -13,27 +14,30 @@ namespace standin {
 // insert's own text is never read as a placeholder; %% stands for one %;
 // every other character, a lone % included, is copied. `insert` is called
 // only for the placeholders that the text holds, once per occurrence. The
-// result replaces what `out` held.
-template <typename InsertFn>
-void expandInserts(std::string& out, std::string_view text, InsertFn&& insert) {
-    out.clear();
-    for (size_t i = 0; i < text.size(); ++i) {
-        char c = text[i];
-        if (c == '%' && i + 1 < text.size()) {
-            char next = text[i + 1];
-            if (next == '1' || next == '2') {
-                out += insert(static_cast<unsigned>(next - '1'));
-                ++i;
-                continue;
-            }
-            if (next == '%') {
-                out += '%';
-                ++i;
-                continue;
-            }
+// result goes to `put(text, length)`, piece by piece, until put says false.
+template <typename InsertFn, typename PutFn>
+void expandInserts(std::string_view text, InsertFn&& insert, PutFn&& put) {
+    size_t plain = 0;  // start of the text not yet put
+    for (size_t i = 0; i + 1 < text.size(); ++i) {
+        if (text[i] != '%')
+            continue;
+        char next = text[i + 1];
+        if (next != '1' && next != '2' && next != '%')
+            continue;
+        if (!put(text.data() + plain, i - plain))
+            return;
+        if (next == '%') {
+            if (!put("%", 1))
+                return;
+        } else {
+            std::string_view value = insert(static_cast<unsigned>(next - '1'));
+            if (!put(value.data(), value.size()))
+                return;
         }
-        out += c;
+        plain = i + 2;
+        ++i;
     }
+    put(text.data() + plain, text.size() - plain);
 }
 
 // The same, as a new text.
@@ -41,8 +45,43 @@ template <typename InsertFn>
 std::string expandInserts(std::string_view text, InsertFn&& insert) {
     std::string out;
     out.reserve(text.size());
-    expandInserts(out, text, std::forward<InsertFn>(insert));
+    expandInserts(text, std::forward<InsertFn>(insert), [&](const char* piece, size_t length) {
+        out.append(piece, length);
+        return true;
+    });
     return out;
+}
+
+// Writes into `buffer` what copyToBuffer would write of the text that
+// expandInserts makes, without making that text; returns the bytes written,
+// terminator not counted.
+template <typename InsertFn>
+size_t expandInsertsInto(std::string_view text, InsertFn&& insert, char* buffer, size_t capacity) {
+    if (capacity == 0)
+        return 0;
+    size_t n = 0;
+    bool cut = false;
+    char firstLeftOut = 0;
+    expandInserts(text, std::forward<InsertFn>(insert), [&](const char* piece, size_t length) {
+        size_t room = capacity - 1 - n;
+        if (length > room) {
+            std::memcpy(buffer + n, piece, room);
+            n += room;
+            cut = true;
+            firstLeftOut = piece[room];
+            return false;
+        }
+        std::memcpy(buffer + n, piece, length);
+        n += length;
+        return true;
+    });
+    // Step back over a character that would be cut, as copyToBuffer does.
+    if (cut) {
+        while (n > 0 && (static_cast<unsigned char>(firstLeftOut) & 0xC0) == 0x80)
+            firstLeftOut = buffer[--n];
+    }
+    buffer[n] = '\0';
+    return n;
 }
 
 // The number of characters in a UTF-8 text (bytes that do not continue a

@@ -55,10 +55,7 @@ extern "C" VRX_EXPORT int32_t sqlogmsg(const char* catalog, uint32_t number,
         return standin::kMessageNotFound;
 
     unsigned entries = insertEntries(insertLengths, inserts);
-    // Composed in a buffer that each thread keeps, so that a message costs
-    // no allocation once the longest one has been composed.
-    thread_local std::string message;
-    standin::expandInserts(message, *text, [&](unsigned index) -> std::string_view {
+    auto insertText = [&](unsigned index) -> std::string_view {
         if (inserts == nullptr || index >= entries || inserts[index] == nullptr)
             return {};
         const char* insert = inserts[index];
@@ -68,7 +65,7 @@ extern "C" VRX_EXPORT int32_t sqlogmsg(const char* catalog, uint32_t number,
                             ? strnlen(insert, static_cast<size_t>(insertLengths[index]))
                             : std::strlen(insert);
         return {insert, length};
-    });
+    };
     size_t capacity = std::min<size_t>(bufferSize, static_cast<size_t>(INT32_MAX));
-    return static_cast<int32_t>(standin::copyToBuffer(message, buffer, capacity));
+    return static_cast<int32_t>(standin::expandInsertsInto(*text, insertText, buffer, capacity));
 }
