@@ -88,6 +88,13 @@ TEST_F(CatalogInsertTest, LongInsertIsCutWithTheText) {
     auto result = fetch("probe.mo", 7, {longName});
     EXPECT_EQ(result.rc, 4999);
     EXPECT_EQ(result.text, "name: " + longName.substr(0, 4993));
+    // An insert is cut where the text would be: never inside a character.
+    instanceCatalog("probe.mo", {{"8", "a%1."}});
+    for (auto [size, expected] : {std::pair{6u, "aöß"}, std::pair{5u, "aö"}, std::pair{4u, "aö"},
+                                  std::pair{3u, "a"}, std::pair{2u, "a"}}) {
+        SCOPED_TRACE(size);
+        EXPECT_EQ(fetch("probe.mo", 8, {"öß"}, size).text, expected);
+    }
 }
 
 TEST_F(CatalogInsertTest, FailuresAnswerNegative) {
