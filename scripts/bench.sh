@@ -10,6 +10,7 @@
 #   BENCH_SIZES     applications of the generated instances ("1000 10000 100000")
 #   BENCH_REPEAT    runs of every whole-run measurement; the best counts (5)
 #   BENCH_MIN_TIME  minimum seconds of each benchmark (0.2)
+#   BENCH_REPETITIONS  repetitions of each benchmark; the best counts (3)
 #   BENCH_FILTER    which benchmarks run (all)
 set -euo pipefail
 
@@ -30,6 +31,7 @@ started=$(date +%s)
 echo "== vrxmtrk benchmarks, $(date -u '+%Y-%m-%d %H:%M UTC'), $(nproc) cores, load $(cut -d' ' -f1-3 /proc/loadavg)"
 echo
 "$bin/mtrk_bench" --benchmark_color=false --benchmark_min_time="${BENCH_MIN_TIME:-0.2}" \
+  --benchmark_repetitions="${BENCH_REPETITIONS:-3}" \
   ${BENCH_FILTER:+--benchmark_filter="$BENCH_FILTER"}
 
 # The least and the greatest of the numbers on standard input.
