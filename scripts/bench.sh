@@ -24,6 +24,11 @@ for tool in $bin/vrxmtrk $bin/vrxmkinstance $bin/vrxbench_snapshots $bin/vrxbenc
 done
 [ -x /usr/bin/time ] || { echo "bench.sh: /usr/bin/time is missing (package time)" >&2; exit 1; }
 
+# Output goes to /dev/null throughout; should it be an ordinary file (as it
+# has been found on a shared machine), every write lands in memory and the
+# floors of writing the output mean something else.
+[ -c /dev/null ] || echo "bench.sh: warning: /dev/null is not the null device; writes to it cost more than they should" >&2
+
 work=$(mktemp -d /tmp/vrxbench.XXXXXX)
 trap 'rm -rf "$work"' EXIT
 started=$(date +%s)

@@ -286,6 +286,18 @@ bool convert(Output& out, const Conversion& c, va_list* args) {
 
 }  // namespace
 
+int copyBounded(char* buffer, size_t size, const char* text) {
+    Output out{buffer, size};
+    out.putText(text);
+    if (out.length > INT_MAX) {
+        errno = EOVERFLOW;
+        return -1;
+    }
+    if (size > 0)
+        buffer[out.length < size ? out.length : size - 1] = '\0';
+    return static_cast<int>(out.length);
+}
+
 int formatBounded(char* buffer, size_t size, const char* format, va_list args) {
     // Read from a copy, so that a call handed over starts from the first
     // argument again.

@@ -16,4 +16,8 @@ namespace standin {
 // vsnprintf.
 int formatBounded(char* buffer, size_t size, const char* format, va_list args);
 
+// What formatBounded writes and returns for the format "%s" with `text`
+// (not null): as much of it as fits, terminated, and its length.
+int copyBounded(char* buffer, size_t size, const char* text);
+
 }  // namespace standin

@@ -44,6 +44,7 @@ TEST(BoundedFormat, TextsAndIntegersAsTheLibraryWritesThem) {
     expectSameAsLibrary("");
     expectSameAsLibrary("100%% sure %s", "of it");
     expectSameAsLibrary("%s", "");
+    expectSameAsLibrary("%s", "a text cut at every buffer size");
     expectSameAsLibrary("%s (%s)", "bph", "USERBP1");
     expectSameAsLibrary("%-12s|", "utilh");
     expectSameAsLibrary("%-12s|", "exactly12chr");
