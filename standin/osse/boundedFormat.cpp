@@ -215,6 +215,26 @@ size_t unsignedText(uint64_t value, char* text) {
     return static_cast<size_t>(end - first);
 }
 
+// The text of an integer conversion's argument, read with its length.
+size_t integerText(const Conversion& c, va_list* args, char* text) {
+    bool isSigned = c.type != 'u';
+    switch (c.length) {
+        case Length::Int:
+            return isSigned ? signedText(va_arg(*args, int), text)
+                            : unsignedText(va_arg(*args, unsigned), text);
+        case Length::Long:
+            return isSigned ? signedText(va_arg(*args, long), text)
+                            : unsignedText(va_arg(*args, unsigned long), text);
+        case Length::LongLong:
+            return isSigned ? signedText(va_arg(*args, long long), text)
+                            : unsignedText(va_arg(*args, unsigned long long), text);
+        case Length::Size:
+            return isSigned ? signedText(va_arg(*args, ptrdiff_t), text)
+                            : unsignedText(va_arg(*args, size_t), text);
+    }
+    return 0;
+}
+
 // Formats one conversion, taking its argument; false hands the call over.
 bool convert(Output& out, const Conversion& c, va_list* args) {
     char text[48];
@@ -242,36 +262,8 @@ bool convert(Output& out, const Conversion& c, va_list* args) {
             break;
         case 'd':
         case 'i':
-            switch (c.length) {
-                case Length::Int:
-                    count = signedText(va_arg(*args, int), text);
-                    break;
-                case Length::Long:
-                    count = signedText(va_arg(*args, long), text);
-                    break;
-                case Length::LongLong:
-                    count = signedText(va_arg(*args, long long), text);
-                    break;
-                case Length::Size:
-                    count = signedText(va_arg(*args, ptrdiff_t), text);
-                    break;
-            }
-            break;
         case 'u':
-            switch (c.length) {
-                case Length::Int:
-                    count = unsignedText(va_arg(*args, unsigned), text);
-                    break;
-                case Length::Long:
-                    count = unsignedText(va_arg(*args, unsigned long), text);
-                    break;
-                case Length::LongLong:
-                    count = unsignedText(va_arg(*args, unsigned long long), text);
-                    break;
-                case Length::Size:
-                    count = unsignedText(va_arg(*args, size_t), text);
-                    break;
-            }
+            count = integerText(c, args, text);
             break;
         case 'f':
             if (!fixedPoint(va_arg(*args, double), c.precision < 0 ? 6 : c.precision, text, count))
@@ -284,18 +276,23 @@ bool convert(Output& out, const Conversion& c, va_list* args) {
     return true;
 }
 
+// Terminates the output and answers as vsnprintf does.
+int finish(const Output& out) {
+    if (out.length > INT_MAX) {
+        errno = EOVERFLOW;
+        return -1;
+    }
+    if (out.size > 0)
+        out.buffer[out.length < out.size ? out.length : out.size - 1] = '\0';
+    return static_cast<int>(out.length);
+}
+
 }  // namespace
 
 int copyBounded(char* buffer, size_t size, const char* text) {
     Output out{buffer, size};
     out.putText(text);
-    if (out.length > INT_MAX) {
-        errno = EOVERFLOW;
-        return -1;
-    }
-    if (size > 0)
-        buffer[out.length < size ? out.length : size - 1] = '\0';
-    return static_cast<int>(out.length);
+    return finish(out);
 }
 
 int formatBounded(char* buffer, size_t size, const char* format, va_list args) {
@@ -320,17 +317,7 @@ int formatBounded(char* buffer, size_t size, const char* format, va_list args) {
         Conversion c;
         handled = parseConversion(at, c) && convert(out, c, &work);
     }
-    int result;
-    if (!handled) {
-        result = std::vsnprintf(buffer, size, format, args);
-    } else if (out.length > INT_MAX) {
-        errno = EOVERFLOW;
-        result = -1;
-    } else {
-        if (size > 0)
-            buffer[out.length < size ? out.length : size - 1] = '\0';
-        result = static_cast<int>(out.length);
-    }
+    int result = handled ? finish(out) : std::vsnprintf(buffer, size, format, args);
     va_end(work);
     return result;
 }
