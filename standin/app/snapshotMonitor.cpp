@@ -239,6 +239,26 @@ int32_t openRequest(uint32_t streamVersion, int32_t partition, uint32_t selector
     return loadServed(kind, served);
 }
 
+// What both entry points answer, in the same order, once the request is
+// open and before the stream's size counts: the configured call result, a
+// stream file that cannot be read, a refusal by SQL code. `answered` says
+// whether one of them answered the call (with the result returned).
+int32_t answerBeforeTheStream(Served& served, bool take, sqlca* ca, bool* answered) {
+    const SnapshotAnswer& shape = served.shape();
+    answer(ca, kSqlOk);
+    *answered = true;
+    if (int32_t rc = take ? shape.takeRc : shape.sizeRc)
+        return rc;
+    if (int32_t rc = loadFileStream(served))
+        return rc;
+    if (int32_t code = refusal(served, take ? shape.takeSqlcode : shape.sizeSqlcode)) {
+        answer(ca, code);
+        return 0;
+    }
+    *answered = false;
+    return 0;
+}
+
 int32_t getSnapshotSize(uint32_t version, MonSizeRequest* request, sqlca* ca) {
     if (version != VRX_MONITOR_VERSION)
         return kMonBadInterfaceVersion;
@@ -250,17 +270,11 @@ int32_t getSnapshotSize(uint32_t version, MonSizeRequest* request, sqlca* ca) {
                                  request->request, served)) {
         return rc;
     }
-    const SnapshotAnswer& shape = served.shape();
-    answer(ca, kSqlOk);
     *request->estimate = 0;
-    if (shape.sizeRc != 0)
-        return shape.sizeRc;
-    if (int32_t rc = loadFileStream(served))
+    bool answered = false;
+    if (int32_t rc = answerBeforeTheStream(served, false, ca, &answered); answered)
         return rc;
-    if (int32_t code = refusal(served, shape.sizeSqlcode)) {
-        answer(ca, code);
-        return 0;
-    }
+    const SnapshotAnswer& shape = served.shape();
     uint64_t size = streamSize(served, scopeOf(served));
     *request->estimate =
         shape.estimate ? *shape.estimate : static_cast<uint32_t>(std::min(size, kMaxBuffer));
@@ -281,16 +295,9 @@ int32_t getSnapshot(uint32_t version, MonSnapshotRequest* request, sqlca* ca) {
                                  request->request, served)) {
         return rc;
     }
-    const SnapshotAnswer& shape = served.shape();
-    answer(ca, kSqlOk);
-    if (shape.takeRc != 0)
-        return shape.takeRc;
-    if (int32_t rc = loadFileStream(served))
+    bool answered = false;
+    if (int32_t rc = answerBeforeTheStream(served, true, ca, &answered); answered)
         return rc;
-    if (int32_t code = refusal(served, shape.takeSqlcode)) {
-        answer(ca, code);
-        return 0;
-    }
     StreamScope scope = scopeOf(served);
     uint64_t size = streamSize(served, scope);
     if (forcedTooSmall(served) || size > request->bufferSize) {
