@@ -10,6 +10,7 @@
 
 #include "benchEnvironment.h"
 #include "benchStreams.h"
+#include "common/monitorCall.h"
 #include "engine/vrxapp.h"
 
 namespace {
@@ -50,38 +51,19 @@ void takeSnapshot(benchmark::State& state) {
     std::string saved = std::getenv("VRX_INSTANCE_DIR");
     setenv("VRX_INSTANCE_DIR", dir.c_str(), 1);
 
-    MonRequest request{};
-    request.objectCount = 1;
-    request.objectType = VRX_OBJ_APPLICATION;
-    uint32_t estimate = 0;
-    MonSizeRequest size{};
-    size.request = &request;
-    size.estimate = &estimate;
-    size.streamVersion = VRX_STREAM_VERSION;
-    size.partition = -1;
-    sqlca ca{};
-    vrxGetSnapshotSize(VRX_MONITOR_VERSION, &size, &ca);
-    std::string buffer(estimate, '\0');
-    MonSnapshotOutput output{};
-    uint32_t engineWord = 0;
-    MonSnapshotRequest take{};
-    take.request = &request;
-    take.output = &output;
-    take.buffer = buffer.data();
-    take.bufferSize = estimate;
-    take.streamVersion = VRX_STREAM_VERSION;
-    take.partition = -1;
-    take.engineWord = &engineWord;
+    standin::MonitorCall call(VRX_OBJ_APPLICATION);
+    call.askSize();
+    std::string buffer(call.estimate, '\0');
     for (auto _ : state) {
-        if (vrxGetSnapshotSize(VRX_MONITOR_VERSION, &size, &ca) != 0 || ca.sqlcode != 0 ||
-            vrxGetSnapshot(VRX_MONITOR_VERSION, &take, &ca) != 0 || ca.sqlcode != 0) {
+        if (call.askSize() != 0 || call.ca.sqlcode != 0 ||
+            call.takeInto(buffer.data(), call.estimate) != 0 || call.ca.sqlcode != 0) {
             state.SkipWithError("the snapshot failed");
         }
     }
     setenv("VRX_INSTANCE_DIR", saved.c_str(), 1);
     std::filesystem::remove_all(dir);
-    state.SetBytesProcessed(state.iterations() * static_cast<int64_t>(estimate));
-    state.counters["stream_MB"] = static_cast<double>(estimate) / 1e6;
+    state.SetBytesProcessed(state.iterations() * static_cast<int64_t>(call.estimate));
+    state.counters["stream_MB"] = static_cast<double>(call.estimate) / 1e6;
 }
 
 BENCHMARK(encodeStream)

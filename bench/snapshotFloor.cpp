@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <cstring>
 
+#include "common/monitorCall.h"
 #include "engine/sqlca.h"
 #include "engine/vrxapp.h"
 #include "engine/vrxsys.h"
@@ -75,36 +76,18 @@ int main(int argc, char** argv) {
             std::fprintf(stderr, "vrxbench_snapshots: unknown object type %s\n", argv[i]);
             return 2;
         }
-        MonRequest request{};
-        request.objectCount = 1;
-        request.objectType = type;
-        uint32_t estimate = 0;
-        MonSizeRequest sizeRequest{};
-        sizeRequest.request = &request;
-        sizeRequest.estimate = &estimate;
-        sizeRequest.streamVersion = VRX_STREAM_VERSION;
-        sizeRequest.partition = -1;
-        sqlca ca{};
-        if (vrxGetSnapshotSize(VRX_MONITOR_VERSION, &sizeRequest, &ca) != 0 || ca.sqlcode != 0) {
+        standin::MonitorCall call(type);
+        if (call.askSize() != 0 || call.ca.sqlcode != 0) {
             std::fprintf(stderr, "vrxbench_snapshots: no estimate for %s\n", argv[i]);
             return 1;
         }
+        uint32_t estimate = call.estimate;
         void* block = nullptr;
         if (sqlogmblkEx(0, estimate, 0, &block, "bench", __LINE__, 0) != 0) {
             std::fputs("vrxbench_snapshots: no memory\n", stderr);
             return 1;
         }
-        MonSnapshotOutput output{};
-        uint32_t engineWord = 0;
-        MonSnapshotRequest take{};
-        take.request = &request;
-        take.output = &output;
-        take.buffer = block;
-        take.bufferSize = estimate;
-        take.streamVersion = VRX_STREAM_VERSION;
-        take.partition = -1;
-        take.engineWord = &engineWord;
-        if (vrxGetSnapshot(VRX_MONITOR_VERSION, &take, &ca) != 0 || ca.sqlcode != 0) {
+        if (call.takeInto(block, estimate) != 0 || call.ca.sqlcode != 0) {
             std::fprintf(stderr, "vrxbench_snapshots: no snapshot of %s\n", argv[i]);
             return 1;
         }

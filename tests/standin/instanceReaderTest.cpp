@@ -18,6 +18,7 @@
 
 #include "common/instance.h"
 #include "common/instanceReader.h"
+#include "common/monitorCall.h"
 #include "engine/vrxapp.h"
 #include "testInstance.h"
 
@@ -419,33 +420,14 @@ std::string served(const mtrktest::TempInstance& instance, const std::string& js
                    uint32_t objectType, bool internal) {
     instance.writeJson(json);
     instance.writeFile("registry", internal ? "VRXMEMTRK=1\n" : "");
-    MonRequest request{};
-    request.objectCount = 1;
-    request.objectType = objectType;
-    uint32_t estimate = 0;
-    MonSizeRequest size{};
-    size.request = &request;
-    size.estimate = &estimate;
-    size.streamVersion = VRX_STREAM_VERSION;
-    size.partition = -1;
-    sqlca ca{};
-    EXPECT_EQ(vrxGetSnapshotSize(VRX_MONITOR_VERSION, &size, &ca), 0);
-    EXPECT_EQ(ca.sqlcode, 0);
-    std::string bytes(estimate + 16, '\xA5');
-    MonSnapshotOutput output{};
-    uint32_t engineWord = 0;
-    MonSnapshotRequest take{};
-    take.request = &request;
-    take.output = &output;
-    take.buffer = bytes.data();
-    take.bufferSize = estimate;
-    take.streamVersion = VRX_STREAM_VERSION;
-    take.partition = -1;
-    take.engineWord = &engineWord;
-    EXPECT_EQ(vrxGetSnapshot(VRX_MONITOR_VERSION, &take, &ca), 0);
-    EXPECT_EQ(ca.sqlcode, 0);
-    EXPECT_EQ(bytes.substr(estimate), std::string(16, '\xA5')) << "written past the buffer";
-    return bytes.substr(0, estimate);
+    standin::MonitorCall call(objectType);
+    EXPECT_EQ(call.askSize(), 0);
+    EXPECT_EQ(call.ca.sqlcode, 0);
+    std::string bytes(call.estimate + 16, '\xA5');
+    EXPECT_EQ(call.takeInto(bytes.data(), call.estimate), 0);
+    EXPECT_EQ(call.ca.sqlcode, 0);
+    EXPECT_EQ(bytes.substr(call.estimate), std::string(16, '\xA5')) << "written past the buffer";
+    return bytes.substr(0, call.estimate);
 }
 
 // The order of keys and lists in the file leaves the stream alone: the

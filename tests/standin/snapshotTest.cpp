@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "app/snapshotCodes.h"
+#include "common/monitorCall.h"
 #include "engine/vrxapp.h"
 #include "streamBuilder.h"
 #include "testInstance.h"
@@ -19,29 +20,15 @@ constexpr auto kNone = std::nullopt;
 
 namespace {
 
-// The argument records of both calls as a well-behaved client fills them.
-struct Call {
-    explicit Call(uint32_t objectType) {
-        request.objectCount = 1;
-        request.objectType = objectType;
-        size.request = &request;
-        size.estimate = &estimate;
-        size.streamVersion = VRX_STREAM_VERSION;
-        size.partition = -1;
-        take.request = &request;
-        take.output = &output;
-        take.streamVersion = VRX_STREAM_VERSION;
-        take.partition = -1;
-        take.engineWord = &engineWord;
-    }
-    int32_t askSize() { return vrxGetSnapshotSize(VRX_MONITOR_VERSION, &size, &ca); }
+// The argument records of both calls as a well-behaved client fills them,
+// with a buffer that has guard bytes behind it.
+struct Call : standin::MonitorCall {
+    using MonitorCall::MonitorCall;
     // Takes into a buffer of `capacity` bytes followed by guard bytes; the
     // buffer starts out filled with a pattern.
     int32_t takeInto(uint32_t capacity) {
         bytes.assign(capacity + kGuard, '\xA5');
-        take.buffer = bytes.data();
-        take.bufferSize = capacity;
-        return vrxGetSnapshot(VRX_MONITOR_VERSION, &take, &ca);
+        return MonitorCall::takeInto(bytes.data(), capacity);
     }
     bool untouchedFrom(size_t offset) const {
         return bytes.find_first_not_of('\xA5', offset) == std::string::npos;
@@ -49,13 +36,6 @@ struct Call {
     std::string stream() const { return bytes.substr(0, take.bufferSize); }
 
     static constexpr uint32_t kGuard = 16;
-    MonRequest request{};
-    MonSizeRequest size{};
-    MonSnapshotRequest take{};
-    MonSnapshotOutput output{};
-    uint32_t engineWord = 0;
-    uint32_t estimate = 0;
-    sqlca ca{};
     std::string bytes;
 };
 
