@@ -16,7 +16,11 @@ namespace standin {
 // only for the placeholders that the text holds, once per occurrence. The
 // result goes to `put(text, length)`, piece by piece, until put says false.
 template <typename InsertFn, typename PutFn>
-void expandInserts(std::string_view text, InsertFn&& insert, PutFn&& put) {
+void expandInserts(std::string_view text, InsertFn&& insert, PutFn&& givenPut) {
+    // Empty pieces are not handed on: an absent insert has no data at all.
+    auto put = [&](const char* piece, size_t length) {
+        return length == 0 || givenPut(piece, length);
+    };
     size_t plain = 0;  // start of the text not yet put
     for (size_t i = 0; i + 1 < text.size(); ++i) {
         if (text[i] != '%')
