@@ -147,14 +147,14 @@ awk -v first="$(echo $sizes | awk '{ print $(NF - 1) }')" -v last="$(echo $sizes
   }' "$work/records"
 
 # How often the engine opens instance.json in the largest column run: one
-# read per take, and one per engine library when it starts.
+# read per take, one at the set-up, one as the libraries load.
 if command -v strace > /dev/null; then
   last=$(echo $sizes | awk '{ print $NF }')
   VRX_INSTANCE_DIR=$work/i$last strace -f -qq -e trace=openat -o "$work/strace" \
     "$bin/vrxmtrk" -i -d -a -p > /dev/null
   reads=$(grep -c 'instance.json", O_RDONLY.* = [0-9]' "$work/strace" || true)
   echo "  reads    $last applications, -i -d -a -p: instance.json opened $reads times for 5 snapshots" \
-       "(one read per take; the rest at start-up, one per engine library)"
+       "(one read per take, one at the set-up, one as the libraries load)"
 fi
 echo
 echo "== Done in $(( $(date +%s) - started )) s"
