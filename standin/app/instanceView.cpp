@@ -25,7 +25,6 @@ std::shared_ptr<const InstanceView> readInstanceView(const std::string& dir, Str
 }
 
 std::shared_ptr<const InstanceView> instanceView(const std::string& dir) {
-    vrxStandinNoteInstanceRequest();
     std::shared_ptr<const InstanceView> kept;
     {
         std::lock_guard lock(gViewMutex);
@@ -33,6 +32,7 @@ std::shared_ptr<const InstanceView> instanceView(const std::string& dir) {
     }
     if (kept != nullptr && kept->dir == dir &&
         stillCurrent((dir + "/instance.json").c_str(), kept->stamp)) {
+        vrxStandinNoteInstanceRequest();  // a read serves it; readInstanceView notes its own
         return kept;
     }
     StreamSizer sizer;

@@ -141,7 +141,6 @@ const Instance& currentInstance() {
     cache.loaded = true;
     cache.dir = dir;
     cache.requests = requests;
-    cache.stamp = FileStamp{};
     auto instance = std::make_unique<Instance>();
     InstanceSink poolsNotKept;
     std::string error;

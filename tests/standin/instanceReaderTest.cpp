@@ -156,6 +156,24 @@ Instance combined(Instance settings, Collector& collector) {
     return settings;
 }
 
+// What readInstanceFile makes of `instance`'s instance.json, with the
+// order in which its pool lists ended.
+struct FileRead {
+    Instance instance;
+    std::vector<PoolList> ended;
+};
+
+FileRead readFile(const mtrktest::TempInstance& instance) {
+    Instance settings;
+    Collector collector;
+    std::string error;
+    EXPECT_TRUE(
+        standin::readInstanceFile(instance.dir().c_str(), settings, collector, error, nullptr))
+        << error;
+    std::vector<PoolList> ended = collector.ended;
+    return {combined(settings, collector), ended};
+}
+
 struct Verdicts {
     bool fast;
     bool thorough;
@@ -302,15 +320,10 @@ TEST(InstanceReaderTest, LeavesUnusualFormsToTheThoroughParser) {
         ASSERT_TRUE(v.thorough) << json;
 
         instance.writeJson(json);
-        Instance settings;
-        Collector collector;
-        std::string error;
-        ASSERT_TRUE(
-            standin::readInstanceFile(instance.dir().c_str(), settings, collector, error, nullptr))
-            << error;
         Instance thorough;
+        std::string error;
         ASSERT_TRUE(standin::parseInstance(json, thorough, error));
-        expectSame(combined(settings, collector), thorough, json);
+        expectSame(readFile(instance).instance, thorough, json);
     }
 }
 
@@ -374,17 +387,12 @@ TEST(InstanceReaderTest, ReadsFilesOfAnySizeAsTheThoroughParserDoes) {
     for (int applications : {0, 1, 5000}) {
         std::string json = largeInstance(applications);
         instance.writeJson(json);
-        Instance settings;
-        Collector collector;
-        std::string error;
-        ASSERT_TRUE(
-            standin::readInstanceFile(instance.dir().c_str(), settings, collector, error, nullptr))
-            << error;
         Instance thorough;
+        std::string error;
         ASSERT_TRUE(standin::loadInstance(instance.dir(), thorough, error)) << error;
-        expectSame(combined(settings, collector), thorough, std::to_string(applications));
-        EXPECT_EQ(collector.ended,
-                  (std::vector<PoolList>{PoolList::Databases, PoolList::Applications}));
+        FileRead read = readFile(instance);
+        expectSame(read.instance, thorough, std::to_string(applications));
+        EXPECT_EQ(read.ended, (std::vector<PoolList>{PoolList::Databases, PoolList::Applications}));
     }
 }
 
